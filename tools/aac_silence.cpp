@@ -101,7 +101,8 @@ int32_t AllocateFrame(std::span<const uint8_t> header, std::span<const uint8_t> 
         return -1;
     if (!header.empty())
         std::memcpy(pFrame, header.data(), header.size());
-    std::memcpy(pFrame + header.size(), body.data(), body.size());
+    if (!body.empty())
+        std::memcpy(pFrame + header.size(), body.data(), body.size());
     *ppFrame = pFrame;
     *puFrameLen = uLen;
     return 0;

@@ -52,18 +52,14 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *pData, size_t uSize)
         uint8_t sentinel = 0;
         uint8_t *pFrame = &sentinel;
         uint32_t uLen = 0;
-        switch (in.Byte() % 6) {
-        case 0: {
-            const uint32_t uFT = in.Byte() < 200 ? in.Byte() % 10 : in.U32();
-            const int32_t iResult = AMRNB_MuteFrame(&pFrame, &uLen, uFT);
-            Check(iResult != 0 || uFT < 8);
-            Consume(iResult, pFrame, uLen, &sentinel);
-            break;
-        }
+        const uint8_t uOp = in.Byte();
+        switch (uOp % 6) {
+        case 0:
         case 1: {
+            const bool bWide = (uOp % 6) == 1;
             const uint32_t uFT = in.Byte() < 200 ? in.Byte() % 10 : in.U32();
-            const int32_t iResult = AMRWB_MuteFrame(&pFrame, &uLen, uFT);
-            Check(iResult != 0 || uFT < 9);
+            const int32_t iResult = (bWide ? AMRWB_MuteFrame : AMRNB_MuteFrame)(&pFrame, &uLen, uFT);
+            Check(iResult != 0 || uFT < (bWide ? 9u : 8u));
             Consume(iResult, pFrame, uLen, &sentinel);
             break;
         }

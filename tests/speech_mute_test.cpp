@@ -84,17 +84,6 @@ TEST_P(AmrMute, RefusedFrameTypesAllocateNothing)
     EXPECT_EQ(kind.pGenerate(&pFrame, nullptr, 0), -1);
 }
 
-TEST_P(AmrMute, AllocationFailureStoresNothing)
-{
-    RecordingSal::Get().FailAllocation(1);
-    uint8_t sentinel = 0;
-    uint8_t *pFrame = &sentinel;
-    uint32_t uLen = 77;
-    EXPECT_EQ(GetParam()->pGenerate(&pFrame, &uLen, 1), -1);
-    EXPECT_EQ(pFrame, &sentinel);
-    EXPECT_EQ(uLen, 77u);
-}
-
 INSTANTIATE_TEST_SUITE_P(NarrowAndWide, AmrMute, testing::Values(&kNb, &kWb),
                          [](const auto &info) { return std::string(info.param->pName); });
 
@@ -174,10 +163,6 @@ TEST_F(DraMute, Refusals)
         else
             EXPECT_TRUE(HasTrace(11, 0, c.format, c.text));
     }
-    RecordingSal::Get().FailAllocation(1);
-    EXPECT_EQ(DRA_MuteFrame(&pFrame, &uLen, 44100, 2), -1);
-    EXPECT_EQ(pFrame, &sentinel);
-    EXPECT_EQ(uLen, 77u);
 }
 
 } // namespace

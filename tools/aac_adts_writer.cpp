@@ -1,17 +1,15 @@
 // The ADTS header of silence frames and of AAC type detection (ISO/IEC 13818-7 adts_fixed_header
 // and adts_variable_header): profile 2, buffer fullness 0x7CF.
-#include <array>
 #include <cstddef>
 
 #include <vorcal/audio_tools.h>
 
 #include "core/sal.hpp"
+#include "tools/aac_rates.hpp"
 
 namespace {
 
-// ADTS sampling_frequency_index 0-11.
-constexpr std::array<int32_t, 12> kSampleRates = {96000, 88200, 64000, 48000, 44100, 32000,
-                                                  24000, 22050, 16000, 12000, 11025, 8000};
+using vorcal::tools::aac::kSampleRates;
 
 // The caller zeroes the header; each field is added into its byte (modulo 256).
 void AddTo(uint8_t *pHeader, int i, uint32_t uValue) noexcept
@@ -23,8 +21,9 @@ void AddTo(uint8_t *pHeader, int i, uint32_t uValue) noexcept
 
 extern "C" int32_t mute_get_samplerate_idx(int32_t iSamplingRate)
 {
+    // Exact rates only: no rounding to a nearby one.
     for (std::size_t i = 0; i < kSampleRates.size(); ++i) {
-        if (kSampleRates[i] == iSamplingRate)
+        if (iSamplingRate >= 0 && kSampleRates[i] == static_cast<uint32_t>(iSamplingRate))
             return static_cast<int32_t>(i);
     }
     return -1;

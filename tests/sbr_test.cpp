@@ -467,10 +467,7 @@ TEST(SbrHeader, SingleRateGrid)
 {
     VrSBRState_OnlyParsing sbr = Fresh(kRate);
     sbr.uTimeRate = 0;
-    BitWriter w;
-    PutHeader(w, 1, 5, 15, 0, 0, 0, 0); // k0 = 12 + 5 = 17, k2 = 3 k0 capped at 64? 51
-    PutMinimalFrame(w, 0, 1, true);
-    // 17..51: 34 bands of width 1 -> 17 low bands; rebuild the frame with that count.
+    // k0 = 12 + 5 = 17, k2 = 3 k0 = 51: 34 linear bands of width 1, 17 low bands.
     BitWriter full;
     PutHeader(full, 1, 5, 15, 0, 0, 0, 0);
     PutMinimalFrame(full, 17, 1, true);

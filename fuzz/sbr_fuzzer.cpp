@@ -43,7 +43,11 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *pData, size_t uSize)
     const uint32_t uFrames = 1 + ((uOptions >> 3) & 3);
     for (uint32_t i = 0; i < uFrames && VrGetProcessedBits_OnlyParsing(&reader) / 8 < in.RestSize(); ++i) {
         const int32_t result = sbr_extension_dataOnlyParsing(&reader, &sbr, uElementId);
-        if (result < 0 || result > 2 || sbr.uNumEnv > VR_SBR_MAX_ENVELOPES || sbr.uNumMaster > VR_SBR_MAX_BANDS)
+        if (result < 0 || result > 2)
+            __builtin_trap();
+        // A result of 2 means a frame was parsed over freshly built tables.
+        if (result == 2 && (sbr.uNumEnv > VR_SBR_MAX_ENVELOPES || sbr.uNumMaster > VR_SBR_MAX_BANDS ||
+                            sbr.uNumHigh > sbr.uNumMaster || sbr.uNumNoiseBands > VR_SBR_MAX_NOISE_BANDS))
             __builtin_trap();
         VrByteAlign_OnlyParsing(&reader);
     }

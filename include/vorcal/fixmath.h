@@ -37,7 +37,8 @@ VORCAL_API int32_t Div_l(int32_t a, int32_t b);
 /* a / b as an integer-fraction pair. Negative a or b gives (0, 0); a == b gives (1, 0),
  * a = b = 0 included; b = 0 with a > 0 gives (0, 0). */
 VORCAL_API void Div_exp(int32_t a, int32_t b, int32_t *piInt, int32_t *piFrac);
-/* a * b in Q15, saturated to 0x7FFFFFFF and 0x80000001 (-0x7FFFFFFF). */
+/* a * b in Q15, saturated to 0x7FFFFFFF and 0x80000001 (-0x7FFFFFFF). Operands are split into
+ * 16-bit halves without 32-bit wrap-around, so -0x7FFFFFFF saturates like +0x7FFFFFFF. */
 VORCAL_API int32_t Mul_l(int32_t a, int32_t b);
 /* a * b in Q15 for a 16-bit Q15 b, saturated upward to 0x7FFFFFFF only. */
 VORCAL_API int32_t Mul_ls(int32_t a, int32_t b);

@@ -52,7 +52,7 @@ constexpr bool RowsMatch()
     for (int i = 0; i < 12; ++i) {
         const VrSampRateInfo_OnlyParsing &r = samp_rate_infoOnlyParsing[i];
         if (r.uSampleRate != VrTBL_SampleRates_OnlyParsing[i] || r.uLongBands != kLong[i] ||
-            r.uShortBands != kShort[i] || !r.puLongTops || !r.puShortTops)
+            r.uShortBands != kShort[i])
             return false;
     }
     for (int i = 12; i < 16; ++i) {

@@ -106,8 +106,8 @@ TEST_F(AacType, ShortFramesArePaddedForTheHeaderParse)
         SCOPED_TRACE(len);
         RecordingSal::Get().Reset();
         CALCodec codec = Instance(0x40);
-        const uint8_t byte = 0xFF; // a lone sync-like byte must not be read as a header
-        EXPECT_EQ(vorCALTools_GetAACType(&codec, 32000, 1, &byte, len), 0x40u);
+        const uint8_t bytes[2] = {0xFF, 0xF1}; // sync-like bytes must not be read as a header
+        EXPECT_EQ(vorCALTools_GetAACType(&codec, 32000, 1, bytes, len), 0x40u);
         ASSERT_EQ(RecordingSal::Get().allocSizes.size(), 1u);
         EXPECT_EQ(RecordingSal::Get().allocSizes[0], 10u);
         EXPECT_EQ(hhDecoder.ADTS.uFrameLength, len + 7);

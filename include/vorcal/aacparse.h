@@ -312,7 +312,9 @@ typedef struct VrProgramConfig_OnlyParsing {
 } VrProgramConfig_OnlyParsing;
 
 /* Detects the stream header at pBuffer (ADIF, ADTS, or none), parses it and prepares the band
- * tables. *puSampleRate and *puChannels are read on the headerless path only. Returns 0. */
+ * tables. *puSampleRate and *puChannels are read on the headerless path only. Returns 0.
+ * Readable bytes needed: 7 headerless, 10 ADTS (11 with CRC); an adif_header with its program
+ * config elements spans at most 4937 bytes, and the reader fetches 3 beyond. */
 VORCAL_API int32_t VrAACDecInitOnlyParsing(VrAACDecoder_OnlyParsing *pDec, const uint8_t *pBuffer,
                                            uint32_t *puSampleRate, uint32_t *puChannels,
                                            uint32_t *puFrameSamples, uint32_t *puSBR,

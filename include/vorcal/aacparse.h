@@ -63,6 +63,289 @@ VORCAL_API int32_t VrByteAlign_OnlyParsing(VrBitReader_OnlyParsing *pBits);
 /* sampling_frequency_index of a rate in Hz (every unknown rate, 44100 included, gives 4). */
 VORCAL_API uint32_t get_samplerate_idxOnlyParsing(uint32_t uSampleRate);
 
+#define VR_AAC_CHANNELS_OnlyParsing 2        /* channel records in the channel map */
+#define VR_AAC_COUPLING_TAGS_OnlyParsing 16  /* coupling channel element tags kept */
+#define VR_AAC_MAX_BANDS_OnlyParsing 128     /* scale factor bands over one block (8 x 16) */
+#define VR_AAC_MAX_SECTIONS_OnlyParsing 129  /* sections per channel (8 windows x 16, plus 1) */
+#define VR_AAC_MAX_WINDOWS_OnlyParsing 8     /* windows of an EIGHT_SHORT_SEQUENCE */
+#define VR_AAC_MAX_TNS_FILTERS_OnlyParsing 3 /* n_filt of a long window (2 bits) */
+#define VR_AAC_MAX_TNS_ORDER_OnlyParsing 31  /* order of a long-window filter (5 bits) */
+#define VR_AAC_MAX_PULSES_OnlyParsing 4      /* number_pulse + 1 */
+#define VR_AAC_FRAME_LINES_OnlyParsing 1024  /* spectral lines of one block */
+
+/* window_sequence values (ISO/IEC 13818-7 8.3.1), the index of the window-information pointers. */
+#define VR_ONLY_LONG_SEQUENCE_OnlyParsing 0
+#define VR_LONG_START_SEQUENCE_OnlyParsing 1
+#define VR_EIGHT_SHORT_SEQUENCE_OnlyParsing 2
+#define VR_LONG_STOP_SEQUENCE_OnlyParsing 3
+
+/* One channel of the channel map. */
+typedef struct VrChannelInfo_OnlyParsing {
+    uint32_t uPresent;
+    uint32_t uTag;               /* element_instance_tag */
+    uint32_t uPairFlag;          /* 1: the channel belongs to a channel pair element */
+    uint32_t uCommonWindow;      /* common_window of its channel pair element */
+    uint32_t uLeftFlag;          /* 1: left channel of a pair */
+    int32_t iPartner;            /* the other channel of the pair */
+    int32_t iWindowInfoChannel;  /* the channel whose ics_info this channel uses */
+} VrChannelInfo_OnlyParsing;
+
+/* The channel map a program config element (or the implicit configuration) builds. */
+typedef struct VrMCInfo_OnlyParsing {
+    uint32_t uChannels;          /* channels mapped */
+    uint32_t uFrontSCE;          /* front single channel elements before the first pair */
+    uint32_t uFront;
+    uint32_t uSide;
+    uint32_t uBack;
+    uint32_t uLFE;
+    uint32_t uCoupling;          /* coupling channel elements */
+    int32_t iCouplingTags[VR_AAC_COUPLING_TAGS_OnlyParsing];
+    uint32_t uProfile;           /* current profile */
+    uint32_t uSampleRateIdx;     /* current sampling_frequency_index */
+    VrChannelInfo_OnlyParsing Channel[VR_AAC_CHANNELS_OnlyParsing];
+} VrMCInfo_OnlyParsing;
+
+/* What VrCheck_MC_Info_OnlyParsing saves of one channel. */
+typedef struct VrSavedChannel_OnlyParsing {
+    uint32_t uPresent;
+    uint32_t uPairFlag;
+    uint32_t uLeftFlag;
+    int32_t iPartner;
+} VrSavedChannel_OnlyParsing;
+
+/* Band layout of one window shape (long or short) at the current sampling rate. */
+typedef struct VrWindowInfo_OnlyParsing {
+    uint32_t uLongFlag;
+    uint32_t uWindowsPerBlock;
+    uint32_t uBinsPerBlock;
+    uint32_t uBandsPerBlock;
+    uint32_t uBinsPerWindow;
+    uint32_t uBandsPerWindow;
+    uint32_t uSectionBits;                /* bits of one sect_len piece */
+    const uint16_t *puBandTops;           /* band end offsets of one window */
+    const uint16_t *puShortBandWidths;    /* sfbwidth128OnlyParsing, or null (long) */
+    uint16_t uBlockBandTops[VR_AAC_MAX_BANDS_OnlyParsing]; /* band ends over the whole block */
+    uint32_t uGroups;
+    uint16_t uGroupLengths[VR_AAC_MAX_WINDOWS_OnlyParsing];
+    uint32_t uGroupOffsets[VR_AAC_MAX_WINDOWS_OnlyParsing];
+} VrWindowInfo_OnlyParsing;
+
+/* adif_header fields (ISO/IEC 13818-7 8.1.1). */
+typedef struct VrADIFHeader_OnlyParsing {
+    uint8_t uAdifId[5];            /* "ADIF" and a terminating 0 */
+    uint32_t uCopyrightIdPresent;
+    uint8_t uCopyrightId[10];      /* nine bytes and a terminating 0 */
+    uint32_t uOriginalCopy;
+    uint32_t uHome;
+    uint32_t uBitstreamType;
+    uint32_t uBitrate;
+} VrADIFHeader_OnlyParsing;
+
+/* adts_fixed_header and adts_variable_header fields (ISO/IEC 13818-7 6.2), stream order. */
+typedef struct VrADTSHeader_OnlyParsing {
+    uint32_t uId;
+    uint32_t uLayer;
+    uint32_t uProtectionAbsent;
+    uint32_t uProfile;
+    uint32_t uSampleRateIdx;
+    uint32_t uPrivateBit;
+    uint32_t uChannelConfig;
+    uint32_t uOriginalCopy;
+    uint32_t uHome;
+    uint32_t uCopyrightIdBit;
+    uint32_t uCopyrightIdStart;
+    uint32_t uFrameLength;
+    uint32_t uBufferFullness;
+    uint32_t uRawDataBlocks;      /* number_of_raw_data_blocks_in_frame */
+} VrADTSHeader_OnlyParsing;
+
+/* One section of section_data. */
+typedef struct VrSection_OnlyParsing {
+    uint32_t uCodebook;
+    uint32_t uEndBand;
+} VrSection_OnlyParsing;
+
+/* Individual channel stream side information of one channel. */
+typedef struct VrICS_OnlyParsing {
+    uint8_t uBandCodebook[VR_AAC_MAX_BANDS_OnlyParsing]; /* codebook of every band of the block */
+    VrSection_OnlyParsing Section[VR_AAC_MAX_SECTIONS_OnlyParsing];
+    uint32_t uSections;           /* 0 marks a section error */
+    uint32_t uWindowSequence;
+    uint8_t uWindowShape;
+    uint32_t uMaxSfb;
+    uint8_t uGroupEnds[VR_AAC_MAX_WINDOWS_OnlyParsing];
+} VrICS_OnlyParsing;
+
+/* One tns_data filter. */
+typedef struct VrTNSFilter_OnlyParsing {
+    uint32_t uLength;
+    uint32_t uOrder;
+    uint32_t uDirection;
+    uint32_t uCoefCompress;
+    int16_t iCoef[VR_AAC_MAX_TNS_ORDER_OnlyParsing];
+} VrTNSFilter_OnlyParsing;
+
+typedef struct VrTNSWindow_OnlyParsing {
+    uint32_t uFilters;            /* n_filt */
+    uint32_t uCoefRes;
+    VrTNSFilter_OnlyParsing Filter[VR_AAC_MAX_TNS_FILTERS_OnlyParsing];
+} VrTNSWindow_OnlyParsing;
+
+typedef struct VrTNSInfo_OnlyParsing {
+    VrTNSWindow_OnlyParsing Window[VR_AAC_MAX_WINDOWS_OnlyParsing];
+} VrTNSInfo_OnlyParsing;
+
+/* pulse_data (ISO/IEC 13818-7 8.3.4). */
+typedef struct VrPulseInfo_OnlyParsing {
+    uint32_t uPulses;             /* number_pulse */
+    uint32_t uStartSfb;           /* pulse_start_sfb */
+    uint32_t uOffset[VR_AAC_MAX_PULSES_OnlyParsing];
+    uint32_t uAmp[VR_AAC_MAX_PULSES_OnlyParsing];
+} VrPulseInfo_OnlyParsing;
+
+/* The decoder state record. */
+typedef struct VrAACDecoder_OnlyParsing {
+    uint32_t uMPEG4;              /* 1 - ADTS ID */
+    uint32_t uFixedHeaderKnown;   /* skip the ADTS fixed header (never set here) */
+    int32_t iConfiguredChannels;  /* -1 when the channel map refused the stream */
+    uint32_t uReportedChannels;   /* the channel value VrAACDecInitOnlyParsing reports */
+    VrBitReader_OnlyParsing Bits;
+    uint32_t uADIF;
+    uint32_t uADTS;
+    VrADIFHeader_OnlyParsing ADIF;
+    VrADTSHeader_OnlyParsing ADTS;
+    VrMCInfo_OnlyParsing MCInfo;
+    VrSavedChannel_OnlyParsing SavedChannel[VR_AAC_CHANNELS_OnlyParsing];
+    uint32_t uImplicitConfig;     /* 1 until a program config element is entered */
+    int32_t iSelectedTag;         /* element_instance_tag of the first program config element */
+    uint32_t uImplicitCPE;        /* the implicit configuration met a channel pair element */
+    VrWindowInfo_OnlyParsing ShortInfo;
+    VrWindowInfo_OnlyParsing LongInfo;
+    VrWindowInfo_OnlyParsing *pWindowInfo[4]; /* by window_sequence */
+
+    /* Working area of the raw data block parsers. */
+    VrICS_OnlyParsing ICS[VR_AAC_CHANNELS_OnlyParsing];
+    int16_t iScaleFactors[VR_AAC_CHANNELS_OnlyParsing][VR_AAC_MAX_BANDS_OnlyParsing];
+    int16_t iBandExponents[VR_AAC_CHANNELS_OnlyParsing][VR_AAC_MAX_BANDS_OnlyParsing];
+    int16_t iSpectrum[VR_AAC_CHANNELS_OnlyParsing][VR_AAC_FRAME_LINES_OnlyParsing];
+    int32_t iNoiseSeeds[VR_AAC_CHANNELS_OnlyParsing][VR_AAC_MAX_BANDS_OnlyParsing];
+    uint8_t uMSMask[VR_AAC_MAX_BANDS_OnlyParsing];
+    VrTNSInfo_OnlyParsing TNS[VR_AAC_CHANNELS_OnlyParsing];
+    VrPulseInfo_OnlyParsing Pulse;
+    uint32_t uPulsePresent;       /* pulse_data_present */
+    int32_t iRandomSeed;          /* running seed of perceptual noise substitution */
+    int16_t iElementExponent;     /* set to -100 by each channel element parser */
+    uint32_t uResetOne[2];        /* the reset sets both to 1; no parser here reads them */
+    uint8_t uResetZero[2];        /* the reset sets both to 0; no parser here reads them */
+} VrAACDecoder_OnlyParsing;
+
+/* One row of samp_rate_infoOnlyParsing. */
+typedef struct VrSampRateInfo_OnlyParsing {
+    uint32_t uSampleRate;
+    uint32_t uLongBands;
+    const uint16_t *puLongTops;
+    uint32_t uShortBands;
+    const uint16_t *puShortTops;
+} VrSampRateInfo_OnlyParsing;
+
+/* The state record of VrAACSBRInfo, and the pointer that call sets to it. Exported so that a
+ * host can inspect the last detection between calls; every function below works on the record
+ * it is given. Not thread-safe: see VrAACSBRInfo. */
+VORCAL_API extern VrAACDecoder_OnlyParsing hhDecoder;
+VORCAL_API extern VrAACDecoder_OnlyParsing *hDecoder;
+
+/* Rates of sampling_frequency_index 0-11. Indices 12-15 have no rate (callers report 0 Hz). */
+VORCAL_API extern const uint32_t VrTBL_SampleRates_OnlyParsing[12];
+/* Per sampling_frequency_index: rate, long bands, long band ends, short bands, short band ends.
+ * Rows 12-15 are zero. */
+VORCAL_API extern const VrSampRateInfo_OnlyParsing samp_rate_infoOnlyParsing[16];
+/* swb_offset_long_window / swb_offset_short_window band end offsets (no leading 0). */
+VORCAL_API extern const uint16_t VrTBL_sfb_96_1024_OnlyParsing[41];
+VORCAL_API extern const uint16_t VrTBL_sfb_96_128_OnlyParsing[12];
+VORCAL_API extern const uint16_t VrTBL_sfb_64_1024_OnlyParsing[47];
+VORCAL_API extern const uint16_t VrTBL_sfb_64_128_OnlyParsing[12];
+VORCAL_API extern const uint16_t VrTBL_sfb_48_1024_OnlyParsing[49];
+VORCAL_API extern const uint16_t VrTBL_sfb_48_128_OnlyParsing[14];
+VORCAL_API extern const uint16_t VrTBL_sfb_32_1024_OnlyParsing[51];
+VORCAL_API extern const uint16_t VrTBL_sfb_24_1024_OnlyParsing[47];
+VORCAL_API extern const uint16_t VrTBL_sfb_24_128_OnlyParsing[15];
+VORCAL_API extern const uint16_t VrTBL_sfb_16_1024_OnlyParsing[43];
+VORCAL_API extern const uint16_t VrTBL_sfb_16_128_OnlyParsing[15];
+VORCAL_API extern const uint16_t VrTBL_sfb_8_1024_OnlyParsing[40];
+VORCAL_API extern const uint16_t VrTBL_sfb_8_128_OnlyParsing[15];
+/* Short band widths, rewritten by every infoinitOnlyParsing. */
+VORCAL_API extern uint16_t sfbwidth128OnlyParsing[16];
+/* Noise scale of gen_rand_vectorOnlyParsing per band width w = 4, 8, ..., 96:
+ * floor(32767 / sqrt(w / 4)), so that the energy sum of w samples (each sample^2 / 4) stays
+ * below 2^30 and every sample fits 16 bits. */
+VORCAL_API extern const uint16_t norm_tblOnlyParsing[24];
+
+/* A parsed program_config_element, as VrEnter_MC_Info_OnlyParsing receives it. */
+typedef struct VrProgramConfig_OnlyParsing {
+    uint32_t uTag;
+    uint32_t uProfile;
+    uint32_t uSampleRateIdx;
+    uint32_t uFront;
+    uint32_t uSide;
+    uint32_t uBack;
+    uint32_t uLFE;
+    uint32_t uAssocData;
+    uint32_t uCoupling;           /* num_valid_cc_elements */
+    uint32_t uMonoMixdown;        /* mono_mixdown_present */
+    uint32_t uMonoMixdownElement;
+    uint32_t uStereoMixdown;
+    uint32_t uStereoMixdownElement;
+    uint32_t uMatrixMixdown;      /* matrix_mixdown_idx_present */
+    uint32_t uMatrixMixdownIdx;
+    uint32_t uPseudoSurround;
+    uint32_t uFrontIsCPE[16];
+    uint32_t uFrontTag[16];
+    uint32_t uSideIsCPE[16];
+    uint32_t uSideTag[16];
+    uint32_t uBackIsCPE[16];
+    uint32_t uBackTag[16];
+    uint32_t uLFETag[4];
+    uint32_t uAssocDataTag[8];
+    uint32_t uCouplingIndSw[16];
+    uint32_t uCouplingTag[16];
+    uint8_t uComment[257];        /* comment_field_data and a terminating 0 */
+} VrProgramConfig_OnlyParsing;
+
+/* Detects the stream header at pBuffer (ADIF, ADTS, or none), parses it and prepares the band
+ * tables. *puSampleRate and *puChannels are read on the headerless path only. Returns 0.
+ * Readable bytes needed: 7 headerless, 10 ADTS (11 with CRC); an adif_header with its program
+ * config elements spans at most 4937 bytes, and the reader fetches 3 beyond. */
+VORCAL_API int32_t VrAACDecInitOnlyParsing(VrAACDecoder_OnlyParsing *pDec, const uint8_t *pBuffer,
+                                           uint32_t *puSampleRate, uint32_t *puChannels,
+                                           uint32_t *puFrameSamples, uint32_t *puSBR,
+                                           uint32_t *puBitsAligned, uint32_t *puHeaderBits);
+/* One ADTS header at the reader's position: 0, or -1 without a sync word (after one retry). */
+VORCAL_API int32_t get_adts_headerOnlyParsing(VrAACDecoder_OnlyParsing *pDec);
+/* adif_header and its program config elements: 1 when one with the selected tag was read, else -1. */
+VORCAL_API int32_t VrGet_ADIF_Header_OnlyParsing(VrAACDecoder_OnlyParsing *pDec);
+/* One program_config_element: its element_instance_tag, or -1 when the channel map refused it. */
+VORCAL_API int32_t VrGet_ProgamConfig_OnlyParsing(VrAACDecoder_OnlyParsing *pDec);
+/* Enters a program config element into the channel map: the channels entered plus the coupling
+ * channel elements, or -1 (more than two front channels, side/back/LFE channels, any mixdown). */
+VORCAL_API int32_t VrEnter_MC_Info_OnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrMCInfo_OnlyParsing *pMap,
+                                               const VrProgramConfig_OnlyParsing *pPCE);
+/* uCopy != 0 saves the mapped channels' attributes and returns 1; 0 compares: 1 equal, 0 not. */
+VORCAL_API int32_t VrCheck_MC_Info_OnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrMCInfo_OnlyParsing *pMap,
+                                               uint32_t uCopy);
+/* Clears the channel map of the implicit configuration (no-op after a program config element). */
+VORCAL_API void reset_mc_infoOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrMCInfo_OnlyParsing *pMap);
+/* Channel index of a channel element (uId 1: channel pair element), or -1. */
+VORCAL_API int32_t chn_configOnlyParsing(VrAACDecoder_OnlyParsing *pDec, uint32_t uId, uint32_t uTag,
+                                         uint32_t uCommonWindow, VrMCInfo_OnlyParsing *pMap);
+/* infoinitOnlyParsing on the row of the current sampling_frequency_index. */
+VORCAL_API void huffbookinitOnlyParsing(VrAACDecoder_OnlyParsing *pDec);
+/* Fills both window information records and sfbwidth128OnlyParsing from one rate row. */
+VORCAL_API void infoinitOnlyParsing(VrAACDecoder_OnlyParsing *pDec, const VrSampRateInfo_OnlyParsing *pRow);
+/* Perceptual noise substitution: iLength normalised random samples, their block exponent and
+ * the advanced seed. */
+VORCAL_API void gen_rand_vectorOnlyParsing(int16_t *piVector, int16_t *piExponent, int32_t iLength,
+                                           int32_t *piSeed);
+
 
 
 /* ------------------------------------------------------------------------------------------
@@ -167,6 +450,14 @@ VORCAL_API extern const uint8_t stopDk_t_tableOnlyParsing[12][14];
  * Detection entry.
  * ---------------------------------------------------------------------------------------- */
 
+/* Resets hhDecoder (hDecoder = &hhDecoder) and parses the ADTS header at buf. Returns 9 with
+ * no output written for a null buffer or no 0xFFF sync; otherwise 0 with the rate in Hz (0 for
+ * sampling_frequency_index 12-15), channel_configuration, SBR (always 0: the raw data block
+ * is not read), and the bits of the header (56, 72 with CRC). len is not used: buf must hold
+ * 10 readable bytes (11 with CRC). Works on one static state: callers on several threads must
+ * serialise it (and vorCALTools_GetAACType, which calls it). */
+VORCAL_API uint32_t VrAACSBRInfo(const uint8_t *buf, uint32_t len, uint32_t *pSampleRate, uint32_t *pChannels,
+                                 uint32_t *pSBR, uint32_t *pBitsAligned, uint32_t *pHeaderBits);
 
 
 #ifdef __cplusplus

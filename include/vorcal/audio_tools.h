@@ -55,8 +55,10 @@ VORCAL_API int32_t DRA_MuteFrame(uint8_t **ppFrame, uint32_t *uFrameLen, uint32_
 
 /* Runs the parse-only decoder over the raw frame behind an ADTS header and stores 64 (AAC) or
  * 65 (AAC with SBR) as the instance's OTI. Returns the OTI, the unchanged OTI of a non-AAC
- * instance (0xFFFFFFFF for a null instance), or 0xFFFFFFFF when the header cannot be built or
- * memory runs out. Not thread-safe: the parse-only decoder has one static state. */
+ * instance or of a null pFrame (nothing allocated; 0xFFFFFFFF for a null instance), or
+ * 0xFFFFFFFF with the instance unchanged when the header cannot be built or memory runs out.
+ * Frames under 2 bytes get extra zero padding for the header parse. Not thread-safe: it runs
+ * VrAACSBRInfo on the parse-only decoder's one static state, so no two calls may overlap. */
 VORCAL_API uint32_t vorCALTools_GetAACType(CALCodec *hCodec, int32_t uSamplingRate,
                                            uint32_t uChannels, const uint8_t *pFrame,
                                            uint32_t uFrameLen);

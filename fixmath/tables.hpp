@@ -9,13 +9,11 @@ namespace vorcal::fixmath {
 
 namespace detail {
 
-__extension__ typedef unsigned __int128 U128;
-
-constexpr U128 ISqrt(U128 v)
+// Bitwise integer square root: floor(sqrt(v)).
+constexpr uint64_t ISqrt(uint64_t v)
 {
-    // Bitwise integer square root: floor(sqrt(v)).
-    U128 r = 0;
-    U128 bit = U128{1} << 126;
+    uint64_t r = 0;
+    uint64_t bit = uint64_t{1} << 62;
     while (bit > v)
         bit >>= 2;
     while (bit != 0) {
@@ -34,21 +32,22 @@ constexpr U128 ISqrt(U128 v)
 // num / den >= (r + 1/2)^2, that is 4 num >= (2r + 1)^2 den.
 constexpr int32_t RoundSqrt(uint64_t num, uint64_t den)
 {
-    const U128 r = ISqrt(U128{num / den});
-    const U128 twice = 2 * r + 1;
-    return static_cast<int32_t>(U128{4} * num >= twice * twice * den ? r + 1 : r);
+    const uint64_t r = ISqrt(num / den);
+    const uint64_t twice = 2 * r + 1;
+    return static_cast<int32_t>(4 * num >= twice * twice * den ? r + 1 : r);
 }
 
-// 2^(j/32) in Q62 for j = 0..32: five square roots of 2 give 2^(1/32), then powers.
-constexpr std::array<U128, 33> kPow2Q62 = [] {
-    constexpr int kQ = 62;
-    U128 root = U128{2} << kQ;
+// 2^(j/32) in Q30 for j = 0..32: five square roots of 2 give 2^(1/32), then powers. 64-bit
+// arithmetic suffices (products stay below 2^62) and serves the 32-bit target alike.
+constexpr int kPow2Q = 30;
+constexpr std::array<uint64_t, 33> kPow2Q30 = [] {
+    uint64_t root = uint64_t{2} << kPow2Q;
     for (int i = 0; i < 5; ++i)
-        root = ISqrt(root << kQ);
-    std::array<U128, 33> p{};
-    p[0] = U128{1} << kQ;
+        root = ISqrt(root << kPow2Q);
+    std::array<uint64_t, 33> p{};
+    p[0] = uint64_t{1} << kPow2Q;
     for (int j = 1; j <= 32; ++j)
-        p[j] = (p[j - 1] * root + (U128{1} << (kQ - 1))) >> kQ;
+        p[j] = (p[j - 1] * root + (uint64_t{1} << (kPow2Q - 1))) >> kPow2Q;
     return p;
 }();
 
@@ -78,7 +77,7 @@ inline constexpr std::array<int16_t, 49> kInvSqrtTable = [] {
 inline constexpr std::array<int16_t, 33> kPow2Table = [] {
     std::array<int16_t, 33> p{};
     for (int j = 0; j < 33; ++j) {
-        const auto v = static_cast<int32_t>((detail::kPow2Q62[j] * 16384 + (detail::U128{1} << 61)) >> 62);
+        const auto v = static_cast<int32_t>((detail::kPow2Q30[j] * 16384 + (uint64_t{1} << (detail::kPow2Q - 1))) >> detail::kPow2Q);
         p[j] = static_cast<int16_t>(v > 32767 ? 32767 : v);
     }
     return p;

@@ -65,7 +65,8 @@ int32_t Deinit(CALParam) { return 0; }
 int32_t Decode(const uint8_t *pData, int32_t iLen, CALParam, CALParam, uint32_t *puResult, CALParam)
 {
     Touch(pData, iLen);
-    *puResult = 0;
+    if (puResult)
+        *puResult = 0;
     return 0;
 }
 

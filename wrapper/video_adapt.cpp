@@ -170,17 +170,13 @@ VideoInitPlan PrepareMPEG4Init(CALCodec *hCodec, const VideoInitArgs &args) noex
         StoreSize(args, dsi.uWidth, dsi.uHeight);
 
     if (args.uOTI == CAL_OTI_MPEG4_VISUAL) {
-        // Both refusals read the record whether or not the walk succeeded.
-        if (VideoPropertyIs(hCodec, CAL_PROP_MPEG4_NO_LEVEL3, 1) && dsi.uLevel == kMPEG4Level3) {
-            VORCAL_TRACE(kTraceError, 0,
-                         "[CAL_Wrapper %d] MPEG4 Error(Profile[%u], Level[%u])!!! MPEG4 codec can't support "
-                         "Level 3.\n",
-                         __LINE__, dsi.uProfile, dsi.uLevel);
-            return Answer(CAL_RESULT_REFUSED);
-        }
-        // An unrecognised profile is reported with the level-3 message as well.
-        if (VideoPropertyIs(hCodec, CAL_PROP_MPEG4_NO_UNKNOWN_PROFILE, 1) && dsi.uProfile == kMPEG4Unrecognised &&
-            dsi.uLevel == kMPEG4Unrecognised) {
+        // Both refusals read the record whether or not the walk succeeded; an unrecognised
+        // profile is reported with the level-3 message as well.
+        const bool bRefused =
+            (VideoPropertyIs(hCodec, CAL_PROP_MPEG4_NO_LEVEL3, 1) && dsi.uLevel == kMPEG4Level3) ||
+            (VideoPropertyIs(hCodec, CAL_PROP_MPEG4_NO_UNKNOWN_PROFILE, 1) && dsi.uProfile == kMPEG4Unrecognised &&
+             dsi.uLevel == kMPEG4Unrecognised);
+        if (bRefused) {
             VORCAL_TRACE(kTraceError, 0,
                          "[CAL_Wrapper %d] MPEG4 Error(Profile[%u], Level[%u])!!! MPEG4 codec can't support "
                          "Level 3.\n",

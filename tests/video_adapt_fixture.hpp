@@ -75,6 +75,9 @@ inline Bytes AvcC(const Bytes &sps, const Bytes &pps, unsigned uNALSize = 4)
     return out;
 }
 
+// A property answer that GetProperty gives with a non-zero result, so that it does not count.
+inline constexpr uint32_t kUnanswered = 0xFFFFFFFF;
+
 // A recording video decoder registered under one OTI and opened as an instance. Every test ends
 // with the handle released and no block of the system layer left.
 class VideoDecoderTest : public ::testing::Test {
@@ -119,6 +122,15 @@ protected:
         baseAllocs = sal.allocSizes.size();
         baseFrees = sal.freeCount;
         baseLive = sal.liveBlocks.size();
+    }
+
+    // GetProperty answers uValue with result 0, or does not answer (kUnanswered).
+    void Answer(uint32_t uProperty, uint32_t uValue)
+    {
+        if (uValue == kUnanswered)
+            codec.Answer(uProperty, 1, -1);
+        else
+            codec.Answer(uProperty, uValue);
     }
 
     // An Init whose only effect is the NAL length size that Decode uses.

@@ -12,17 +12,6 @@ namespace {
 
 const Bytes kSPS = MakeSPS(66, 640, 480);
 
-constexpr uint32_t kUnanswered = 0xFFFFFFFF;
-
-// A property answer: value uValue with result 0, or a GetProperty that does not answer.
-void Answer(uint32_t uProperty, uint32_t uValue)
-{
-    if (uValue == kUnanswered)
-        RecordingCodec::Get().Answer(uProperty, 1, -1);
-    else
-        RecordingCodec::Get().Answer(uProperty, uValue);
-}
-
 // ---- H.264 Init: configuration framing ------------------------------------------------------
 
 struct ConfigCase {

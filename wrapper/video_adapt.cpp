@@ -206,7 +206,9 @@ bool AdaptH264Frame(CALCodec *hCodec, VideoFrame &frame, CALParam uParam3, uint3
 {
     const int32_t iNALSize = static_cast<int32_t>(hCodec->m_uH264NALSize);
 
-    // In-band parameter sets: cut the SEI/SPS/PPS run and everything in front of it.
+    // In-band parameter sets: cut the SEI/SPS/PPS run and everything in front of it. The format
+    // test takes a 4-byte length of 0x100 to 0x1FF (00 00 01 xx) for a start code, so such a
+    // length-prefixed frame is searched, and later converted, as start-code framed.
     uint32_t uValue = 0;
     if (VideoPropertyAnswered(hCodec, CAL_PROP_H264_INBAND_PARAM_SETS, &uValue) && uValue == 0) {
         const bool bAnnexB = vorCALTools_AVC_CheckFormat(frame.pData, frame.iLen) == CAL_AVC_FORMAT_ANNEXB;

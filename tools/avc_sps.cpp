@@ -42,10 +42,13 @@ uint32_t ParseSps(CALToolsBS &r, CALSPSInfo &info) noexcept
 {
     // profile_idc, then level_idc after the constraint-flags byte; the reader then stands at
     // seq_parameter_set_id.
+    // Single loads (not a byte skip, which stops at the end of the data) keep level_idc right
+    // in an SPS cut just after it.
     info.uProfile = r.uCache >> 24;
-    bs::SkipBytes(r, 2);
+    bs::Load(r);
+    bs::Load(r);
     info.uLevel = r.uCache >> 24;
-    bs::SkipBytes(r, 1);
+    bs::Load(r);
     // seq_parameter_set_id, log2_max_frame_num_minus4. The profile-dependent fields (chroma
     // format and the ones after it) are not read, whatever profile_idc is.
     SkipUE(r, 2);

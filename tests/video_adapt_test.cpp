@@ -123,19 +123,26 @@ TEST_F(VideoDecoderTest, FailedCodecInitFreesIntermediateBuffer)
     EXPECT_EQ(sal.liveBlocks.size(), baseLive); // temporary and intermediate buffers gone
 }
 
-// Each allocation of an Init that converts both configurations fails in turn.
+// Each allocation of an Init that converts both configurations fails in turn; the buffer an
+// earlier Init left goes as after a failed codec Init.
 TEST_F(VideoDecoderTest, InitAllocationFailureReturnsMinusOneWithoutCallingCodec)
 {
     Open(CAL_OTI_H264);
     Answer(CAL_PROP_H264_CONFIG_FORMAT, 2);
+    const Bytes enhance = Prefixed({kSPS}, 4);
+    ASSERT_EQ(Init(CAL_OTI_H264, kAnnexBConfig, enhance, 4, 0x99), 0);
     for (uint32_t n = 1; n <= 2; ++n) {
+        codec.Reset();
+        Answer(CAL_PROP_H264_CONFIG_FORMAT, 2);
+        ASSERT_EQ(Init(CAL_OTI_H264, kAnnexBConfig, enhance), 0);
+        hCodec->m_uUserData = 0x55;
         sal.FailAllocation(n);
-        EXPECT_EQ(Init(CAL_OTI_H264, AvcC(kSPS, kPPS), Prefixed({kSPS}, 4), 4, 0x99), -1) << n;
-        EXPECT_EQ(codec.Count(1), 0u);
-        EXPECT_EQ(hCodec->m_uUserData, 0u);
+        EXPECT_EQ(Init(CAL_OTI_H264, AvcC(kSPS, kPPS), Prefixed({kSPS, kPPS}, 4)), -1) << n;
+        EXPECT_EQ(codec.Count(1), 1u);
+        EXPECT_EQ(hCodec->m_uUserData, 0x55u);
+        EXPECT_EQ(hCodec->m_pIntermediateFrame, nullptr);
         EXPECT_EQ(sal.liveBlocks.size(), baseLive) << n;
     }
-    sal.FailAllocation(0);
     EXPECT_EQ(Init(CAL_OTI_H264, AvcC(kSPS, kPPS), Prefixed({kSPS}, 4)), 0);
 }
 

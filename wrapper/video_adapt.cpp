@@ -78,6 +78,20 @@ inline VideoInitPlan Answer(int32_t iResult) noexcept
     return plan;
 }
 
+// No memory for a conversion: Init fails with -1 before the codec is called and, like an Init
+// the codec failed, leaves neither buffer behind.
+VideoInitPlan FailInit(CALCodec *hCodec, uint8_t *pTemporaryConfig) noexcept
+{
+    if (pTemporaryConfig)
+        sal::Free(pTemporaryConfig);
+    if (hCodec->m_pIntermediateFrame && hCodec->m_iIntermediateFrameSize != 0) {
+        sal::Free(hCodec->m_pIntermediateFrame);
+        hCodec->m_pIntermediateFrame = nullptr;
+        hCodec->m_iIntermediateFrameSize = 0;
+    }
+    return Answer(-1);
+}
+
 VideoInitPlan PrepareH264Init(CALCodec *hCodec, VideoInitArgs &args) noexcept
 {
     // The configuration as the caller passed it, parsed at most once for size and profile.
@@ -119,10 +133,10 @@ VideoInitPlan PrepareH264Init(CALCodec *hCodec, VideoInitArgs &args) noexcept
         vorCALTools_AVC_CheckFormat(args.pConfig, args.iConfigLen) != iWanted) {
         const int64_t iSize = (static_cast<int64_t>(args.iConfigLen) * 3) / 2;
         if (iSize > INT32_MAX)
-            return Answer(-1);
+            return FailInit(hCodec, nullptr);
         plan.pTemporaryConfig = static_cast<uint8_t *>(sal::Alloc(static_cast<uint32_t>(iSize)));
         if (!plan.pTemporaryConfig)
-            return Answer(-1);
+            return FailInit(hCodec, nullptr);
         args.iConfigLen = vorCALTools_AVC_ConvertFormatPSs(plan.pTemporaryConfig, static_cast<int32_t>(iSize),
                                                            args.pConfig, args.iConfigLen);
         args.pConfig = plan.pTemporaryConfig;
@@ -131,10 +145,8 @@ VideoInitPlan PrepareH264Init(CALCodec *hCodec, VideoInitArgs &args) noexcept
     // Enhancement configuration: converted into the intermediate buffer.
     if (Readable(args.pConfigEnhance, args.iEnhLen) &&
         vorCALTools_AVC_CheckFormat(args.pConfigEnhance, args.iEnhLen) != iWanted) {
-        if (!ReserveIntermediate(hCodec, args.iEnhLen)) {
-            sal::Free(plan.pTemporaryConfig);
-            return Answer(-1);
-        }
+        if (!ReserveIntermediate(hCodec, args.iEnhLen))
+            return FailInit(hCodec, plan.pTemporaryConfig);
         const int32_t iNewLen = vorCALTools_AVC_ConvertFormat(
             hCodec->m_pIntermediateFrame, args.iEnhLen + kIntermediateHeadroom, args.pConfigEnhance,
             args.iEnhLen, static_cast<int32_t>(args.uNALLengthSize));

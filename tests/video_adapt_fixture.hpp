@@ -1,5 +1,5 @@
-// Shared by the video decoder adaptation tests: NAL unit builders for both H.264 framings and a
-// fixture that drives a recording video decoder through a CAL handle.
+// Shared by the video decoder adaptation tests: a few H.264 units (framed with the builders of
+// avc_streams.hpp) and a fixture that drives a recording video decoder through a CAL handle.
 #pragma once
 
 #include <gtest/gtest.h>
@@ -11,37 +11,12 @@
 #include <vorcal/core.h>
 #include <vorcal/wrapper.h>
 
+#include "avc_streams.hpp"
 #include "bit_writer.hpp"
 #include "recording_codec.hpp"
 #include "recording_sal.hpp"
 
 namespace vorcal::test {
-
-using Bytes = std::vector<uint8_t>;
-
-// Each unit behind a start code (4-byte 00 00 00 01 or 3-byte 00 00 01).
-inline Bytes AnnexB(std::initializer_list<Bytes> units, size_t uStartCodeLen = 4)
-{
-    Bytes out;
-    for (const Bytes &unit : units) {
-        out.insert(out.end(), uStartCodeLen - 3, 0);
-        out.insert(out.end(), {0, 0, 1});
-        out.insert(out.end(), unit.begin(), unit.end());
-    }
-    return out;
-}
-
-// Each unit behind a big-endian length field of uSize bytes.
-inline Bytes Prefixed(std::initializer_list<Bytes> units, unsigned uSize)
-{
-    Bytes out;
-    for (const Bytes &unit : units) {
-        for (unsigned i = uSize; i-- > 0;)
-            out.push_back(static_cast<uint8_t>(unit.size() >> (8 * i)));
-        out.insert(out.end(), unit.begin(), unit.end());
-    }
-    return out;
-}
 
 // The fields of a sequence parameter set that the size and profile parse reads (ITU-T H.264
 // 7.3.2.1.1 with pic_order_cnt_type 2, no cropping, no VUI).
@@ -55,10 +30,8 @@ inline Bytes MakeSPS(uint8_t uProfile, uint32_t uWidth, uint32_t uHeight)
     return BitWriter::Escape(w.Bytes());
 }
 
-inline const Bytes kPPS = {0x68, 0xCE, 0x38, 0x80};
 inline const Bytes kIDR = {0x65, 0x88, 0x84, 0x00, 0x10, 0x2F};
 inline const Bytes kSlice = {0x41, 0x9A, 0x12, 0x34};
-inline const Bytes kSEI = {0x06, 0x05, 0x01, 0xAA, 0x80};
 inline const Bytes kAUD = {0x09, 0xF0};
 
 // AVC decoder configuration record (ISO/IEC 14496-15) with one SPS and one PPS.

@@ -46,23 +46,23 @@ TEST_P(H264ConfigTest, CodecReceivesWantedFraming)
     EXPECT_EQ(sal.liveBlocks.size(), baseLive);
 }
 
-const Bytes kAnnexBConfig = AnnexB({kSPS, kPPS});
+const Bytes kAnnexBConfig = AnnexB({kSPS, kPps});
 const Bytes kParamList = [] {
     Bytes list = {1, 0, static_cast<uint8_t>(kSPS.size())};
     list.insert(list.end(), kSPS.begin(), kSPS.end());
-    list.insert(list.end(), {1, 0, static_cast<uint8_t>(kPPS.size())});
-    list.insert(list.end(), kPPS.begin(), kPPS.end());
+    list.insert(list.end(), {1, 0, static_cast<uint8_t>(kPps.size())});
+    list.insert(list.end(), kPps.begin(), kPps.end());
     return list;
 }();
 
 INSTANTIATE_TEST_SUITE_P(
     Framings, H264ConfigTest,
-    ::testing::Values(ConfigCase{"RecordToAnnexB", 2, AvcC(kSPS, kPPS), kAnnexBConfig, true},
+    ::testing::Values(ConfigCase{"RecordToAnnexB", 2, AvcC(kSPS, kPps), kAnnexBConfig, true},
                       ConfigCase{"AnnexBKept", 2, kAnnexBConfig, kAnnexBConfig, false},
                       ConfigCase{"AnnexBToList", 1, kAnnexBConfig, kParamList, true},
-                      ConfigCase{"RecordKept", 1, AvcC(kSPS, kPPS), AvcC(kSPS, kPPS), false},
-                      ConfigCase{"OtherValueKept", 3, AvcC(kSPS, kPPS), AvcC(kSPS, kPPS), false},
-                      ConfigCase{"UnansweredKept", kUnanswered, AvcC(kSPS, kPPS), AvcC(kSPS, kPPS), false}),
+                      ConfigCase{"RecordKept", 1, AvcC(kSPS, kPps), AvcC(kSPS, kPps), false},
+                      ConfigCase{"OtherValueKept", 3, AvcC(kSPS, kPps), AvcC(kSPS, kPps), false},
+                      ConfigCase{"UnansweredKept", kUnanswered, AvcC(kSPS, kPps), AvcC(kSPS, kPps), false}),
     [](const auto &info) { return std::string(info.param.name); });
 
 TEST_F(VideoDecoderTest, AnnexBConfigurationIsPassedByPointer)
@@ -79,7 +79,7 @@ TEST_F(VideoDecoderTest, EnhancementConvertedIntoIntermediateBuffer)
 {
     Open(CAL_OTI_H264);
     Answer(CAL_PROP_H264_CONFIG_FORMAT, 2);
-    const Bytes enhance = Prefixed({kSPS, kPPS}, 4);
+    const Bytes enhance = LengthPrefixed({kSPS, kPps}, 4);
     ASSERT_EQ(Init(CAL_OTI_H264, kAnnexBConfig, enhance), 0);
     const CodecCall *pInit = codec.Last(1);
     EXPECT_EQ(pInit->args[3], P(hCodec->m_pIntermediateFrame));
@@ -117,7 +117,7 @@ TEST_F(VideoDecoderTest, FailedCodecInitFreesIntermediateBuffer)
     Open(CAL_OTI_H264);
     Answer(CAL_PROP_H264_CONFIG_FORMAT, 2);
     codec.results[1] = 5;
-    EXPECT_EQ(Init(CAL_OTI_H264, AvcC(kSPS, kPPS), Prefixed({kSPS}, 4)), 5);
+    EXPECT_EQ(Init(CAL_OTI_H264, AvcC(kSPS, kPps), LengthPrefixed({kSPS}, 4)), 5);
     EXPECT_EQ(hCodec->m_pIntermediateFrame, nullptr);
     EXPECT_EQ(hCodec->m_iIntermediateFrameSize, 0);
     EXPECT_EQ(sal.liveBlocks.size(), baseLive); // temporary and intermediate buffers gone
@@ -129,7 +129,7 @@ TEST_F(VideoDecoderTest, InitAllocationFailureReturnsMinusOneWithoutCallingCodec
 {
     Open(CAL_OTI_H264);
     Answer(CAL_PROP_H264_CONFIG_FORMAT, 2);
-    const Bytes enhance = Prefixed({kSPS}, 4);
+    const Bytes enhance = LengthPrefixed({kSPS}, 4);
     ASSERT_EQ(Init(CAL_OTI_H264, kAnnexBConfig, enhance, 4, 0x99), 0);
     for (uint32_t n = 1; n <= 2; ++n) {
         codec.Reset();
@@ -137,13 +137,13 @@ TEST_F(VideoDecoderTest, InitAllocationFailureReturnsMinusOneWithoutCallingCodec
         ASSERT_EQ(Init(CAL_OTI_H264, kAnnexBConfig, enhance), 0);
         hCodec->m_uUserData = 0x55;
         sal.FailAllocation(n);
-        EXPECT_EQ(Init(CAL_OTI_H264, AvcC(kSPS, kPPS), Prefixed({kSPS, kPPS}, 4)), -1) << n;
+        EXPECT_EQ(Init(CAL_OTI_H264, AvcC(kSPS, kPps), LengthPrefixed({kSPS, kPps}, 4)), -1) << n;
         EXPECT_EQ(codec.Count(1), 1u);
         EXPECT_EQ(hCodec->m_uUserData, 0x55u);
         EXPECT_EQ(hCodec->m_pIntermediateFrame, nullptr);
         EXPECT_EQ(sal.liveBlocks.size(), baseLive) << n;
     }
-    EXPECT_EQ(Init(CAL_OTI_H264, AvcC(kSPS, kPPS), Prefixed({kSPS}, 4)), 0);
+    EXPECT_EQ(Init(CAL_OTI_H264, AvcC(kSPS, kPps), LengthPrefixed({kSPS}, 4)), 0);
 }
 
 // ---- H.264 Init: picture size and Main-profile refusal --------------------------------------
@@ -162,7 +162,7 @@ TEST_P(H264ProfileTest, MainProfileRefusedOnlyWhenAsked)
     Open(CAL_OTI_H264);
     Answer(CAL_PROP_H264_NO_MAIN_PROFILE, c.u84);
     hCodec->m_uUserData = 0x55;
-    const int32_t iResult = Init(CAL_OTI_H264, AnnexB({MakeSPS(c.uProfile, 320, 240), kPPS}));
+    const int32_t iResult = Init(CAL_OTI_H264, AnnexB({MakeSPS(c.uProfile, 320, 240), kPps}));
     const std::string msg = "[CAL_Wrapper %d] H.264 Error(Profile[%u], Level[%u])!!! H.264 codec can't support "
                             "profile[Main Profile]\n";
     if (c.bRefused) {
@@ -192,10 +192,10 @@ TEST_F(VideoDecoderTest, H264SizeFromSequenceParameterSet)
         Bytes config;
         uint32_t uWidth, uHeight;
     } cases[] = {
-        {1, AnnexB({kSEI, kSPS, kPPS}), 640, 480},
-        {0, AnnexB({kSPS, kPPS}), 0, 0},
-        {kUnanswered, AnnexB({kSPS, kPPS}), 0, 0},
-        {1, AvcC(kSPS, kPPS), 0, 0}, // the size is read from start-code framing only
+        {1, AnnexB({kSei, kSPS, kPps}), 640, 480},
+        {0, AnnexB({kSPS, kPps}), 0, 0},
+        {kUnanswered, AnnexB({kSPS, kPps}), 0, 0},
+        {1, AvcC(kSPS, kPps), 0, 0}, // the size is read from start-code framing only
     };
     for (const auto &c : cases) {
         codec.Reset();
@@ -340,33 +340,33 @@ TEST_P(H264FrameTest, CodecReceivesAdaptedFrame)
         EXPECT_EQ(sal.CountFormat(discard), 0u);
 }
 
-const Bytes kAnnexBAU = AnnexB({kSPS, kPPS, kIDR});
+const Bytes kAnnexBAU = AnnexB({kSPS, kPps, kIDR});
 
 INSTANTIATE_TEST_SUITE_P(
     Frames, H264FrameTest,
     ::testing::Values(
         FrameCase{"AnnexBParameterSetsRemoved", 4, 0, kUnanswered, kAnnexBAU, AnnexB({kIDR}), "ANNEX-B"},
-        FrameCase{"ThreeByteStartCodes", 4, 0, kUnanswered, AnnexB({kSEI, kSPS, kPPS, kIDR}, 3), AnnexB({kIDR}, 3),
+        FrameCase{"ThreeByteStartCodes", 4, 0, kUnanswered, AnnexB({kSei, kSPS, kPps, kIDR}, {3}), AnnexB({kIDR}, {3}),
                   "ANNEX-B"},
-        FrameCase{"LeadingUnitsGoWithTheRun", 4, 0, kUnanswered, AnnexB({kAUD, kSPS, kPPS, kIDR}), AnnexB({kIDR}),
+        FrameCase{"LeadingUnitsGoWithTheRun", 4, 0, kUnanswered, AnnexB({kAUD, kSPS, kPps, kIDR}), AnnexB({kIDR}),
                   "ANNEX-B"},
-        FrameCase{"OnlyParameterSetsDropped", 4, 0, kUnanswered, AnnexB({kSPS, kPPS}), {}, "ANNEX-B"},
-        FrameCase{"Size4Removed", 4, 0, kUnanswered, Prefixed({kSEI, kSPS, kPPS, kIDR, kSlice}, 4),
-                  Prefixed({kIDR, kSlice}, 4), "NAL"},
-        FrameCase{"Size2Removed", 2, 0, kUnanswered, Prefixed({kSPS, kPPS, kIDR}, 2), Prefixed({kIDR}, 2), "NAL"},
-        FrameCase{"Size1Removed", 1, 0, kUnanswered, Prefixed({kSPS, kPPS, kIDR}, 1), Prefixed({kIDR}, 1), "NAL"},
-        FrameCase{"FourBytesLeftPass", 2, 0, kUnanswered, Prefixed({kSPS, kPPS, {0x65, 0x88}}, 2),
-                  Prefixed({{0x65, 0x88}}, 2), "NAL"},
-        FrameCase{"ThreeBytesLeftDropped", 2, 0, kUnanswered, Prefixed({kSPS, kPPS, {0x65}}, 2), {}, "NAL"},
+        FrameCase{"OnlyParameterSetsDropped", 4, 0, kUnanswered, AnnexB({kSPS, kPps}), {}, "ANNEX-B"},
+        FrameCase{"Size4Removed", 4, 0, kUnanswered, LengthPrefixed({kSei, kSPS, kPps, kIDR, kSlice}, 4),
+                  LengthPrefixed({kIDR, kSlice}, 4), "NAL"},
+        FrameCase{"Size2Removed", 2, 0, kUnanswered, LengthPrefixed({kSPS, kPps, kIDR}, 2), LengthPrefixed({kIDR}, 2), "NAL"},
+        FrameCase{"Size1Removed", 1, 0, kUnanswered, LengthPrefixed({kSPS, kPps, kIDR}, 1), LengthPrefixed({kIDR}, 1), "NAL"},
+        FrameCase{"FourBytesLeftPass", 2, 0, kUnanswered, LengthPrefixed({kSPS, kPps, {0x65, 0x88}}, 2),
+                  LengthPrefixed({{0x65, 0x88}}, 2), "NAL"},
+        FrameCase{"ThreeBytesLeftDropped", 2, 0, kUnanswered, LengthPrefixed({kSPS, kPps, {0x65}}, 2), {}, "NAL"},
         FrameCase{"NoRunUnchanged", 4, 0, kUnanswered, AnnexB({kIDR}), AnnexB({kIDR}), nullptr},
         FrameCase{"83AnsweredOneKeeps", 4, 1, kUnanswered, kAnnexBAU, kAnnexBAU, nullptr},
         FrameCase{"83UnansweredKeeps", 4, kUnanswered, kUnanswered, kAnnexBAU, kAnnexBAU, nullptr},
-        FrameCase{"AnnexBToPrefixed", 2, kUnanswered, 1, kAnnexBAU, Prefixed({kSPS, kPPS, kIDR}, 4), nullptr},
-        FrameCase{"PrefixedToAnnexB", 2, kUnanswered, 2, Prefixed({kSPS, kIDR}, 2), AnnexB({kSPS, kIDR}), nullptr},
-        FrameCase{"SameFramingKept", 4, kUnanswered, 2, AnnexB({kIDR}, 3), AnnexB({kIDR}, 3), nullptr},
-        FrameCase{"OtherValueKept", 4, kUnanswered, 3, Prefixed({kIDR}, 4), Prefixed({kIDR}, 4), nullptr},
-        FrameCase{"RemovedThenAnnexB", 3, 0, 2, Prefixed({kSPS, kPPS, kIDR}, 3), AnnexB({kIDR}), "NAL"},
-        FrameCase{"RemovedThenPrefixed", 4, 0, 1, kAnnexBAU, Prefixed({kIDR}, 4), "ANNEX-B"},
+        FrameCase{"AnnexBToPrefixed", 2, kUnanswered, 1, kAnnexBAU, LengthPrefixed({kSPS, kPps, kIDR}, 4), nullptr},
+        FrameCase{"PrefixedToAnnexB", 2, kUnanswered, 2, LengthPrefixed({kSPS, kIDR}, 2), AnnexB({kSPS, kIDR}), nullptr},
+        FrameCase{"SameFramingKept", 4, kUnanswered, 2, AnnexB({kIDR}, {3}), AnnexB({kIDR}, {3}), nullptr},
+        FrameCase{"OtherValueKept", 4, kUnanswered, 3, LengthPrefixed({kIDR}, 4), LengthPrefixed({kIDR}, 4), nullptr},
+        FrameCase{"RemovedThenAnnexB", 3, 0, 2, LengthPrefixed({kSPS, kPps, kIDR}, 3), AnnexB({kIDR}), "NAL"},
+        FrameCase{"RemovedThenPrefixed", 4, 0, 1, kAnnexBAU, LengthPrefixed({kIDR}, 4), "ANNEX-B"},
         FrameCase{"ConversionFails", 4, kUnanswered, 2, {0, 0, 0, 0xFF, 0x65, 0x88}, {}, nullptr}),
     [](const auto &info) { return std::string(info.param.name); });
 
@@ -377,7 +377,7 @@ TEST_F(VideoDecoderTest, InvalidLengthAndConversionFailureMessages)
     Answer(CAL_PROP_H264_INBAND_PARAM_SETS, 0);
     Answer(CAL_PROP_H264_FRAME_FORMAT, 2);
     uint32_t uWord = 0;
-    EXPECT_EQ(Decode(AnnexB({kSPS, kPPS}), &uWord), 1);
+    EXPECT_EQ(Decode(AnnexB({kSPS, kPps}), &uWord), 1);
     EXPECT_TRUE(HasTrace(16, 0, "[CAL_Wrapper %d] InValid Frame Len (%d)\n", "[CAL_Wrapper #] InValid Frame Len (0)\n"));
     codec.Answer(CAL_PROP_H264_INBAND_PARAM_SETS, 1);
     EXPECT_EQ(Decode({0, 0, 0, 0xFF, 0x65, 0x88}, &uWord, 0x2A), 1);
@@ -395,7 +395,7 @@ TEST_F(VideoDecoderTest, IntermediateBufferGrowsAndIsReused)
     Answer(CAL_PROP_H264_FRAME_FORMAT, 1);
     uint32_t uWord = 0;
     const Bytes small = AnnexB({kIDR});
-    const Bytes large = AnnexB({kSPS, kPPS, kIDR, kSlice});
+    const Bytes large = AnnexB({kSPS, kPps, kIDR, kSlice});
     const size_t uBase = sal.allocSizes.size();
     const size_t uFrees = sal.freeCount;
 
@@ -433,7 +433,7 @@ TEST_F(VideoDecoderTest, DecodeAllocationFailureDropsFrame)
     EXPECT_EQ(Decode(kAnnexBAU, &uWord), 1);
     EXPECT_EQ(hCodec->m_iIntermediateFrameSize, 0);
     EXPECT_EQ(Decode(kAnnexBAU, &uWord), 0);
-    EXPECT_EQ(Received(), Prefixed({kSPS, kPPS, kIDR}, 4));
+    EXPECT_EQ(Received(), LengthPrefixed({kSPS, kPps, kIDR}, 4));
 }
 
 // ---- MPEG-4 Visual and other OTIs in Decode ------------------------------------------------
@@ -478,7 +478,7 @@ TEST_F(VideoDecoderTest, DumpRecordsHoldInputBeforeAdaptation)
     Answer(CAL_PROP_H264_CONFIG_FORMAT, 2);
     Answer(CAL_PROP_H264_INBAND_PARAM_SETS, 0);
     Answer(CAL_PROP_H264_FRAME_FORMAT, 1);
-    const Bytes config = AvcC(kSPS, kPPS);
+    const Bytes config = AvcC(kSPS, kPps);
     ASSERT_EQ(Init(CAL_OTI_H264, config), 0);
     uint32_t uWord = 0;
     ASSERT_EQ(Decode(kAnnexBAU, &uWord), 0);
@@ -513,7 +513,7 @@ TEST_F(VideoDecoderTest, NullInstanceAndUnreadableFrames)
     // An empty frame is examined: once a buffer exists, its conversion fails as documented.
     InitNALSize(4);
     const uint8_t byte = 0;
-    ASSERT_EQ(Decode(Prefixed({kIDR}, 4), &uWord), 0);
+    ASSERT_EQ(Decode(LengthPrefixed({kIDR}, 4), &uWord), 0);
     EXPECT_EQ(vorCAL_VideoDecoderDecode(hCodec, &byte, 0, 3, 0, &uWord), 1);
     EXPECT_TRUE(HasTrace(11, 0, "[CAL_Wrapper %d] vorCALTools_AVC_ConvertFormat failed[%d],iLen[%d]\n",
                          "[CAL_Wrapper #] vorCALTools_AVC_ConvertFormat failed[3],iLen[0]\n"));

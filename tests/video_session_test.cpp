@@ -22,7 +22,7 @@ struct Unit {
 
 bool IsSlice(uint8_t uType) { return uType == 1 || uType == 5; }
 
-std::vector<Unit> SplitPrefixed(const Bytes &data)
+std::vector<Unit> SplitLengthPrefixed(const Bytes &data)
 {
     std::vector<Unit> units;
     for (size_t p = 0; p + 4 < data.size();) {
@@ -170,7 +170,7 @@ TEST_F(H264SessionTest, AnnexBToLengthPrefixed)
         uint32_t uWord = 0;
         ASSERT_EQ(Decode(annexBSamples[i], &uWord), 0) << "sample " << i;
         const Bytes &mp4 = mp4Samples[i];
-        const std::vector<Unit> units = SplitPrefixed(mp4);
+        const std::vector<Unit> units = SplitLengthPrefixed(mp4);
         EXPECT_EQ(Received(), Bytes(mp4.begin() + units[FirstKeptUnit(mp4, units)].uStart, mp4.end()))
             << "sample " << i;
         // What was converted: the start-code frame from its first kept unit on.

@@ -124,17 +124,17 @@ inline size_t CheckCandidates(const uint8_t *p, Mask m) noexcept
 constexpr size_t kStride = 64;
 // As the SSE2 screen below: lanes AND FE FF, a byte-wise minimum, and the last offset apart.
 template <bool kCopy>
-inline __m256i MaskedBlock(const uint8_t *p, uint8_t *q) noexcept
+inline __m256i MaskedBlock(const uint8_t *p, uint8_t *q, size_t k) noexcept
 {
-    const __m256i v = _mm256_loadu_si256(reinterpret_cast<const __m256i *>(p));
+    const __m256i v = _mm256_loadu_si256(reinterpret_cast<const __m256i *>(p + k));
     if constexpr (kCopy)
-        _mm256_storeu_si256(reinterpret_cast<__m256i *>(q), v);
+        _mm256_storeu_si256(reinterpret_cast<__m256i *>(q + k), v);
     return _mm256_and_si256(v, _mm256_set1_epi16(static_cast<short>(0xFEFF)));
 }
 template <bool kCopy>
 inline bool StrideScan(const uint8_t *p, uint8_t *q) noexcept
 {
-    const __m256i m = _mm256_min_epu8(MaskedBlock<kCopy>(p, q), MaskedBlock<kCopy>(p + 32, q + 32));
+    const __m256i m = _mm256_min_epu8(MaskedBlock<kCopy>(p, q, 0), MaskedBlock<kCopy>(p, q, 32));
     return _mm256_movemask_epi8(_mm256_cmpeq_epi16(m, _mm256_setzero_si256())) != 0 || (p[63] | p[64]) == 0;
 }
 inline bool StrideHasZeroPair(const uint8_t *p) noexcept
@@ -152,18 +152,18 @@ constexpr size_t kStride = 64;
 // blocks keeps every such lane at zero (and seldom makes others zero, which the exact check
 // then drops). A prefix at the last offset has its 00 01 outside the stride: tested apart.
 template <bool kCopy>
-inline __m128i MaskedBlock(const uint8_t *p, uint8_t *q) noexcept
+inline __m128i MaskedBlock(const uint8_t *p, uint8_t *q, size_t k) noexcept
 {
-    const __m128i v = _mm_loadu_si128(reinterpret_cast<const __m128i *>(p));
+    const __m128i v = _mm_loadu_si128(reinterpret_cast<const __m128i *>(p + k));
     if constexpr (kCopy)
-        _mm_storeu_si128(reinterpret_cast<__m128i *>(q), v);
+        _mm_storeu_si128(reinterpret_cast<__m128i *>(q + k), v);
     return _mm_and_si128(v, _mm_set1_epi16(static_cast<short>(0xFEFF)));
 }
 template <bool kCopy>
 inline bool StrideScan(const uint8_t *p, uint8_t *q) noexcept
 {
-    const __m128i a = _mm_min_epu8(MaskedBlock<kCopy>(p, q), MaskedBlock<kCopy>(p + 16, q + 16));
-    const __m128i b = _mm_min_epu8(MaskedBlock<kCopy>(p + 32, q + 32), MaskedBlock<kCopy>(p + 48, q + 48));
+    const __m128i a = _mm_min_epu8(MaskedBlock<kCopy>(p, q, 0), MaskedBlock<kCopy>(p, q, 16));
+    const __m128i b = _mm_min_epu8(MaskedBlock<kCopy>(p, q, 32), MaskedBlock<kCopy>(p, q, 48));
     return _mm_movemask_epi8(_mm_cmpeq_epi16(_mm_min_epu8(a, b), _mm_setzero_si128())) != 0 || (p[63] | p[64]) == 0;
 }
 inline bool StrideHasZeroPair(const uint8_t *p) noexcept

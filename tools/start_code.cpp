@@ -152,7 +152,7 @@ inline bool StrideMayHoldPrefix(const uint8_t *p, uint8_t *q) noexcept
 
 // First prefix beginning in the stride at p, or kStride. The stride plus two bytes must be
 // readable.
-inline size_t FindInStride(const uint8_t *p) noexcept
+[[maybe_unused]] inline size_t FindInStride(const uint8_t *p) noexcept
 {
     for (size_t b = 0; b < kStride; b += kBlock) {
         const size_t k = ScanBlock<false>(p + b, nullptr);

@@ -9,6 +9,8 @@
 #include <random>
 #include <vector>
 
+#include "tests/support/bit_writer.hpp"
+
 namespace vorcal::bench {
 
 struct AvcFrame {
@@ -27,19 +29,6 @@ struct AvcStream {
 
 namespace detail {
 
-inline void AppendEscaped(std::vector<uint8_t> &out, const std::vector<uint8_t> &rbsp)
-{
-    int zeros = 0;
-    for (uint8_t b : rbsp) {
-        if (zeros >= 2 && b <= 3) {
-            out.push_back(3);
-            zeros = 0;
-        }
-        out.push_back(b);
-        zeros = b == 0 ? zeros + 1 : 0;
-    }
-}
-
 // One NAL unit: header byte, then n payload bytes escaped, ending in a non-zero byte (the
 // rbsp_stop_one_bit).
 inline std::vector<uint8_t> Unit(std::mt19937 &rng, uint8_t header, size_t n)
@@ -50,7 +39,8 @@ inline std::vector<uint8_t> Unit(std::mt19937 &rng, uint8_t header, size_t n)
     if (!rbsp.empty())
         rbsp.back() = 0x80;
     std::vector<uint8_t> unit{header};
-    AppendEscaped(unit, rbsp);
+    const std::vector<uint8_t> escaped = test::BitWriter::Escape(rbsp);
+    unit.insert(unit.end(), escaped.begin(), escaped.end());
     return unit;
 }
 

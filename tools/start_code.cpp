@@ -1,6 +1,6 @@
-// Start-code search: whole blocks are screened with vector compares (AVX2, SSE2 or NEON,
-// chosen at compile time) or 8-byte words, and only positions that can begin 00 00 01 are
-// checked byte by byte.
+// Start-code search: 64-byte strides and then blocks are screened with vector compares (AVX2,
+// SSE2 or NEON, chosen at compile time) or 8-byte words, and only positions that can begin
+// 00 00 01 are checked byte by byte.
 #include "tools/start_code.hpp"
 
 #include <bit>
@@ -21,93 +21,98 @@ inline bool PrefixAt(const uint8_t *p) noexcept
     return p[0] == 0 && p[1] == 0 && p[2] == 1;
 }
 
-// Candidate mask of one block: bit k when position k may begin a prefix. Positions whose
-// prefix would reach into the next block are kept as candidates on their zero bytes alone.
+// The per-architecture layer: a block type Vec of kBlock bytes with Load and Store, the
+// candidate mask of one block (bit k when position k may begin a prefix; positions whose
+// prefix would reach into the next block are kept on their zero bytes alone), and for the
+// stride screen below LaneMask, Min and AnyZeroLane.
 #if defined(__AVX2__)
+using Vec = __m256i;
 constexpr size_t kBlock = 32;
-using Mask = uint32_t;
-inline Mask Candidates(__m256i v) noexcept
+inline Vec Load(const uint8_t *p) noexcept { return _mm256_loadu_si256(reinterpret_cast<const Vec *>(p)); }
+inline void Store(uint8_t *q, Vec v) noexcept { _mm256_storeu_si256(reinterpret_cast<Vec *>(q), v); }
+inline uint32_t Candidates(Vec v) noexcept
 {
-    const Mask z = static_cast<Mask>(_mm256_movemask_epi8(_mm256_cmpeq_epi8(v, _mm256_setzero_si256())));
-    const Mask o = static_cast<Mask>(_mm256_movemask_epi8(_mm256_cmpeq_epi8(v, _mm256_set1_epi8(1))));
+    const uint32_t z = static_cast<uint32_t>(_mm256_movemask_epi8(_mm256_cmpeq_epi8(v, _mm256_setzero_si256())));
+    const uint32_t o = static_cast<uint32_t>(_mm256_movemask_epi8(_mm256_cmpeq_epi8(v, _mm256_set1_epi8(1))));
     return z & ((z >> 1) | 0x80000000u) & ((o >> 2) | 0xC0000000u);
 }
-inline Mask BlockCandidates(const uint8_t *p) noexcept
-{
-    return Candidates(_mm256_loadu_si256(reinterpret_cast<const __m256i *>(p)));
-}
-inline Mask BlockCandidatesCopy(const uint8_t *p, uint8_t *q) noexcept
-{
-    const __m256i v = _mm256_loadu_si256(reinterpret_cast<const __m256i *>(p));
-    _mm256_storeu_si256(reinterpret_cast<__m256i *>(q), v);
-    return Candidates(v);
-}
+inline Vec LaneMask(Vec v) noexcept { return _mm256_and_si256(v, _mm256_set1_epi16(static_cast<short>(0xFEFF))); }
+inline Vec Min(Vec a, Vec b) noexcept { return _mm256_min_epu8(a, b); }
+inline bool AnyZeroLane(Vec v) noexcept { return _mm256_movemask_epi8(_mm256_cmpeq_epi16(v, _mm256_setzero_si256())) != 0; }
+constexpr size_t kStride = 64;
 #elif defined(__SSE2__)
+using Vec = __m128i;
 constexpr size_t kBlock = 16;
-using Mask = uint32_t;
-inline Mask Candidates(__m128i v) noexcept
+inline Vec Load(const uint8_t *p) noexcept { return _mm_loadu_si128(reinterpret_cast<const Vec *>(p)); }
+inline void Store(uint8_t *q, Vec v) noexcept { _mm_storeu_si128(reinterpret_cast<Vec *>(q), v); }
+inline uint32_t Candidates(Vec v) noexcept
 {
-    const Mask z = static_cast<Mask>(_mm_movemask_epi8(_mm_cmpeq_epi8(v, _mm_setzero_si128())));
-    const Mask o = static_cast<Mask>(_mm_movemask_epi8(_mm_cmpeq_epi8(v, _mm_set1_epi8(1))));
+    const uint32_t z = static_cast<uint32_t>(_mm_movemask_epi8(_mm_cmpeq_epi8(v, _mm_setzero_si128())));
+    const uint32_t o = static_cast<uint32_t>(_mm_movemask_epi8(_mm_cmpeq_epi8(v, _mm_set1_epi8(1))));
     return z & ((z >> 1) | 0x8000u) & ((o >> 2) | 0xC000u);
 }
-inline Mask BlockCandidates(const uint8_t *p) noexcept
-{
-    return Candidates(_mm_loadu_si128(reinterpret_cast<const __m128i *>(p)));
-}
-inline Mask BlockCandidatesCopy(const uint8_t *p, uint8_t *q) noexcept
-{
-    const __m128i v = _mm_loadu_si128(reinterpret_cast<const __m128i *>(p));
-    _mm_storeu_si128(reinterpret_cast<__m128i *>(q), v);
-    return Candidates(v);
-}
+inline Vec LaneMask(Vec v) noexcept { return _mm_and_si128(v, _mm_set1_epi16(static_cast<short>(0xFEFF))); }
+inline Vec Min(Vec a, Vec b) noexcept { return _mm_min_epu8(a, b); }
+inline bool AnyZeroLane(Vec v) noexcept { return _mm_movemask_epi8(_mm_cmpeq_epi16(v, _mm_setzero_si128())) != 0; }
+constexpr size_t kStride = 64;
 #elif defined(__ARM_NEON)
 // NEON has no byte movemask: a block with any zero byte makes every position a candidate,
 // which the byte check then sorts out (rare in coded slice data).
+using Vec = uint8x16_t;
 constexpr size_t kBlock = 16;
-using Mask = uint32_t;
-inline Mask Candidates(uint8x16_t v) noexcept
+inline Vec Load(const uint8_t *p) noexcept { return vld1q_u8(p); }
+inline void Store(uint8_t *q, Vec v) noexcept { vst1q_u8(q, v); }
+inline bool AnyNonZero(uint8x16_t v) noexcept
 {
-    const uint64x2_t z = vreinterpretq_u64_u8(vceqq_u8(v, vdupq_n_u8(0)));
-    return (vgetq_lane_u64(z, 0) | vgetq_lane_u64(z, 1)) != 0 ? 0xFFFFu : 0u;
+    const uint64x2_t w = vreinterpretq_u64_u8(v);
+    return (vgetq_lane_u64(w, 0) | vgetq_lane_u64(w, 1)) != 0;
 }
-inline Mask BlockCandidates(const uint8_t *p) noexcept
+inline uint32_t Candidates(Vec v) noexcept { return AnyNonZero(vceqq_u8(v, vdupq_n_u8(0))) ? 0xFFFFu : 0u; }
+inline Vec LaneMask(Vec v) noexcept { return vandq_u8(v, vreinterpretq_u8_u16(vdupq_n_u16(0xFEFF))); }
+inline Vec Min(Vec a, Vec b) noexcept { return vminq_u8(a, b); }
+inline bool AnyZeroLane(Vec v) noexcept
 {
-    return Candidates(vld1q_u8(p));
+    return AnyNonZero(vreinterpretq_u8_u16(vceqq_u16(vreinterpretq_u16_u8(v), vdupq_n_u16(0))));
 }
-inline Mask BlockCandidatesCopy(const uint8_t *p, uint8_t *q) noexcept
-{
-    const uint8x16_t v = vld1q_u8(p);
-    vst1q_u8(q, v);
-    return Candidates(v);
-}
+constexpr size_t kStride = 64;
 #else
-// Portable: an 8-byte word; a candidate wherever the word holds a zero byte.
+// Portable: an 8-byte word, a candidate wherever it holds a zero byte; no stride screen.
+using Vec = uint64_t;
 constexpr size_t kBlock = 8;
-using Mask = uint32_t;
-inline Mask Candidates(uint64_t w) noexcept
+inline Vec Load(const uint8_t *p) noexcept
+{
+    Vec w;
+    memcpy(&w, p, sizeof w);
+    return w;
+}
+inline void Store(uint8_t *q, Vec w) noexcept { memcpy(q, &w, sizeof w); }
+inline uint32_t Candidates(Vec w) noexcept
 {
     const uint64_t kOnes = 0x0101010101010101ull;
     return ((w - kOnes) & ~w & (kOnes << 7)) != 0 ? 0xFFu : 0u;
 }
-inline Mask BlockCandidates(const uint8_t *p) noexcept
-{
-    uint64_t w;
-    memcpy(&w, p, sizeof w);
-    return Candidates(w);
-}
-inline Mask BlockCandidatesCopy(const uint8_t *p, uint8_t *q) noexcept
-{
-    uint64_t w;
-    memcpy(&w, p, sizeof w);
-    memcpy(q, &w, sizeof w);
-    return Candidates(w);
-}
+// Never called (no stride screen); declared for the generic code.
+[[maybe_unused]] inline Vec LaneMask(Vec w) noexcept { return w; }
+[[maybe_unused]] inline Vec Min(Vec a, Vec) noexcept { return a; }
+[[maybe_unused]] inline bool AnyZeroLane(Vec) noexcept { return true; }
+constexpr size_t kStride = 0;
 #endif
+
+static_assert(kStride == 0 || kStride == 2 * kBlock || kStride == 4 * kBlock, "a stride is two or four blocks");
+
+// One block loaded (and copied to q + k when kCopy).
+template <bool kCopy>
+inline Vec LoadBlock(const uint8_t *p, uint8_t *q, size_t k) noexcept
+{
+    const Vec v = Load(p + k);
+    if constexpr (kCopy)
+        Store(q + k, v);
+    return v;
+}
 
 // First candidate of the block at p that really begins a prefix, or kBlock. The block plus
 // two bytes must be readable.
-inline size_t CheckCandidates(const uint8_t *p, Mask m) noexcept
+inline size_t CheckCandidates(const uint8_t *p, uint32_t m) noexcept
 {
     for (; m != 0; m &= m - 1) {
         const size_t k = static_cast<size_t>(std::countr_zero(m));
@@ -117,109 +122,67 @@ inline size_t CheckCandidates(const uint8_t *p, Mask m) noexcept
     return kBlock;
 }
 
-// Stride screening: a prefix needs two zero bytes in a row, rare in coded data, so whole
-// 64-byte strides are tested for a zero pair (bytes k and k + 1, compares on the stride and on
-// the stride shifted by one byte) before any position is looked at. Reads p[0..64].
-#if defined(__AVX2__)
-constexpr size_t kStride = 64;
-// As the SSE2 screen below: lanes AND FE FF, a byte-wise minimum, and the last offset apart.
+// First prefix beginning in the block at p, or kBlock.
 template <bool kCopy>
-inline __m256i MaskedBlock(const uint8_t *p, uint8_t *q, size_t k) noexcept
+inline size_t ScanBlock(const uint8_t *p, uint8_t *q) noexcept
 {
-    const __m256i v = _mm256_loadu_si256(reinterpret_cast<const __m256i *>(p + k));
-    if constexpr (kCopy)
-        _mm256_storeu_si256(reinterpret_cast<__m256i *>(q + k), v);
-    return _mm256_and_si256(v, _mm256_set1_epi16(static_cast<short>(0xFEFF)));
+    const uint32_t m = Candidates(LoadBlock<kCopy>(p, q, 0));
+    return m != 0 ? CheckCandidates(p, m) : kBlock;
 }
-template <bool kCopy>
-inline bool StrideScan(const uint8_t *p, uint8_t *q) noexcept
-{
-    const __m256i m = _mm256_min_epu8(MaskedBlock<kCopy>(p, q, 0), MaskedBlock<kCopy>(p, q, 32));
-    return _mm256_movemask_epi8(_mm256_cmpeq_epi16(m, _mm256_setzero_si256())) != 0 || (p[63] | p[64]) == 0;
-}
-inline bool StrideHasZeroPair(const uint8_t *p) noexcept
-{
-    return StrideScan<false>(p, nullptr);
-}
-inline bool StrideHasZeroPairCopy(const uint8_t *p, uint8_t *q) noexcept
-{
-    return StrideScan<true>(p, q);
-}
-#elif defined(__SSE2__)
-constexpr size_t kStride = 64;
-// A prefix at an even offset of the stride makes a 16-bit lane 00 00; at an odd offset the
-// next lane holds 00 01. Both are "lane AND FE FF is zero"; a byte-wise minimum over the four
-// blocks keeps every such lane at zero (and seldom makes others zero, which the exact check
-// then drops). A prefix at the last offset has its 00 01 outside the stride: tested apart.
-template <bool kCopy>
-inline __m128i MaskedBlock(const uint8_t *p, uint8_t *q, size_t k) noexcept
-{
-    const __m128i v = _mm_loadu_si128(reinterpret_cast<const __m128i *>(p + k));
-    if constexpr (kCopy)
-        _mm_storeu_si128(reinterpret_cast<__m128i *>(q + k), v);
-    return _mm_and_si128(v, _mm_set1_epi16(static_cast<short>(0xFEFF)));
-}
-template <bool kCopy>
-inline bool StrideScan(const uint8_t *p, uint8_t *q) noexcept
-{
-    const __m128i a = _mm_min_epu8(MaskedBlock<kCopy>(p, q, 0), MaskedBlock<kCopy>(p, q, 16));
-    const __m128i b = _mm_min_epu8(MaskedBlock<kCopy>(p, q, 32), MaskedBlock<kCopy>(p, q, 48));
-    return _mm_movemask_epi8(_mm_cmpeq_epi16(_mm_min_epu8(a, b), _mm_setzero_si128())) != 0 || (p[63] | p[64]) == 0;
-}
-inline bool StrideHasZeroPair(const uint8_t *p) noexcept
-{
-    return StrideScan<false>(p, nullptr);
-}
-inline bool StrideHasZeroPairCopy(const uint8_t *p, uint8_t *q) noexcept
-{
-    return StrideScan<true>(p, q);
-}
-#elif defined(__ARM_NEON)
-constexpr size_t kStride = 64;
-inline uint8x16_t ZeroPairs16(const uint8_t *p) noexcept
-{
-    const uint8x16_t z = vdupq_n_u8(0);
-    return vandq_u8(vceqq_u8(vld1q_u8(p), z), vceqq_u8(vld1q_u8(p + 1), z));
-}
-inline bool StrideHasZeroPair(const uint8_t *p) noexcept
-{
-    const uint8x16_t a = vorrq_u8(vorrq_u8(ZeroPairs16(p), ZeroPairs16(p + 16)),
-                                  vorrq_u8(ZeroPairs16(p + 32), ZeroPairs16(p + 48)));
-    const uint64x2_t w = vreinterpretq_u64_u8(a);
-    return (vgetq_lane_u64(w, 0) | vgetq_lane_u64(w, 1)) != 0;
-}
-inline bool StrideHasZeroPairCopy(const uint8_t *p, uint8_t *q) noexcept
-{
-    for (size_t k = 0; k < 64; k += 16)
-        vst1q_u8(q + k, vld1q_u8(p + k));
-    return StrideHasZeroPair(p);
-}
-#else
-// Portable: the blocks alone (8-byte words).
-constexpr size_t kStride = 0;
-inline bool StrideHasZeroPair(const uint8_t *) noexcept
-{
-    return true;
-}
-inline bool StrideHasZeroPairCopy(const uint8_t *, uint8_t *) noexcept
-{
-    return true;
-}
-#endif
 
-// First prefix beginning in the stride at p (blocks, then candidates), or kStride. The stride
-// plus two bytes must be readable.
-inline size_t FindInStride(const uint8_t *p) noexcept
+// Stride screen (64 bytes): a prefix at an even offset of the stride makes a 16-bit lane
+// 00 00, at an odd offset the next lane holds 00 01; both are "lane AND FE FF is zero". A
+// byte-wise minimum over the blocks keeps every such lane at zero (and seldom makes others
+// zero, which the blocks then drop). A prefix at the last offset has its 00 01 outside the
+// stride and is tested apart. Reads p[0..64]; true when the stride needs a closer look.
+template <bool kCopy>
+inline bool StrideMayHoldPrefix(const uint8_t *p, uint8_t *q) noexcept
+{
+    if constexpr (kStride == 0) {
+        return true;
+    } else {
+        auto lanes = [&](size_t b) { return LaneMask(LoadBlock<kCopy>(p, q, b * kBlock)); };
+        // A minimum tree, not a chain through the stride.
+        Vec m = Min(lanes(0), lanes(1));
+        if constexpr (kStride == 4 * kBlock)
+            m = Min(m, Min(lanes(2), lanes(3)));
+        return AnyZeroLane(m) || (p[kStride - 1] | p[kStride]) == 0;
+    }
+}
+
+// First prefix beginning in the stride at p, or kStride. The stride plus two bytes must be
+// readable.
+[[maybe_unused]] inline size_t FindInStride(const uint8_t *p) noexcept
 {
     for (size_t b = 0; b < kStride; b += kBlock) {
-        const Mask m = BlockCandidates(p + b);
-        if (m != 0) {
-            const size_t k = CheckCandidates(p + b, m);
-            if (k != kBlock)
-                return b + k;
-        }
+        const size_t k = ScanBlock<false>(p + b, nullptr);
+        if (k != kBlock)
+            return b + k;
     }
     return kStride;
+}
+
+// The search from i while whole strides, then whole blocks, fit below uStop (and are copied
+// to pDst + (position - uFrom) when kCopy). Returns the prefix found or uEnd; i is left at
+// the first position not yet examined.
+template <bool kCopy>
+inline size_t ScanWhole(const uint8_t *pData, size_t &i, size_t uFrom, size_t uStop, size_t uEnd, uint8_t *pDst) noexcept
+{
+    if constexpr (kStride != 0) {
+        for (; i + kStride <= uStop; i += kStride) {
+            if (StrideMayHoldPrefix<kCopy>(pData + i, kCopy ? pDst + (i - uFrom) : nullptr)) {
+                const size_t k = FindInStride(pData + i);
+                if (k != kStride)
+                    return i + k;
+            }
+        }
+    }
+    for (; i + kBlock <= uStop; i += kBlock) {
+        const size_t k = ScanBlock<kCopy>(pData + i, kCopy ? pDst + (i - uFrom) : nullptr);
+        if (k != kBlock)
+            return i + k;
+    }
+    return uEnd;
 }
 
 } // namespace
@@ -230,23 +193,9 @@ size_t FindStartCodePrefix(const uint8_t *pData, size_t uFrom, size_t uEnd) noex
         return uEnd;
     const size_t uLast = uEnd - 2; // a prefix begins below uLast
     size_t i = uFrom;
-    if constexpr (kStride != 0) {
-        for (; i + kStride <= uLast; i += kStride) {
-            if (StrideHasZeroPair(pData + i)) {
-                const size_t k = FindInStride(pData + i);
-                if (k != kStride)
-                    return i + k;
-            }
-        }
-    }
-    for (; i + kBlock <= uLast; i += kBlock) {
-        const Mask m = BlockCandidates(pData + i);
-        if (m != 0) {
-            const size_t k = CheckCandidates(pData + i, m);
-            if (k != kBlock)
-                return i + k;
-        }
-    }
+    const size_t r = ScanWhole<false>(pData, i, uFrom, uLast, uEnd, nullptr);
+    if (r != uEnd)
+        return r;
     for (; i < uLast; ++i) {
         if (PrefixAt(pData + i))
             return i;
@@ -259,32 +208,18 @@ size_t FindStartCodePrefixCopy(const uint8_t *pData, size_t uFrom, size_t uEnd, 
 {
     size_t i = uFrom;
     if (uEnd >= 3 && uFrom < uEnd - 2) {
+        // Whole strides and blocks while both the source and the room allow.
         const size_t uLast = uEnd - 2;
-        if constexpr (kStride != 0) {
-            // Whole strides while both the source and the room allow.
-            const size_t uStop = uDstRoom < uLast - uFrom ? uFrom + uDstRoom : uLast;
-            for (; i + kStride <= uStop; i += kStride) {
-                if (StrideHasZeroPairCopy(pData + i, pDst + (i - uFrom))) {
-                    const size_t k = FindInStride(pData + i);
-                    if (k != kStride)
-                        return i + k;
-                }
-            }
-        }
-        for (; i + kBlock <= uLast && i - uFrom + kBlock <= uDstRoom; i += kBlock) {
-            const Mask m = BlockCandidatesCopy(pData + i, pDst + (i - uFrom));
-            if (m != 0) {
-                const size_t k = CheckCandidates(pData + i, m);
-                if (k != kBlock)
-                    return i + k;
-            }
-        }
+        const size_t uStop = uDstRoom < uLast - uFrom ? uFrom + uDstRoom : uLast;
+        const size_t r = ScanWhole<true>(pData, i, uFrom, uStop, uEnd, pDst);
+        if (r != uEnd)
+            return r;
     }
     // The tail (or a destination too short for whole blocks): plain search, then one copy.
     const size_t r = FindStartCodePrefix(pData, i, uEnd);
-    const size_t uStop = r < uEnd ? r : uEnd;
-    if (uStop > i && i - uFrom < uDstRoom) {
-        const size_t n = uStop - i;
+    const size_t uCopyEnd = r < uEnd ? r : uEnd;
+    if (uCopyEnd > i && i - uFrom < uDstRoom) {
+        const size_t n = uCopyEnd - i;
         const size_t uRoom = uDstRoom - (i - uFrom);
         memcpy(pDst + (i - uFrom), pData + i, n < uRoom ? n : uRoom);
     }

@@ -416,6 +416,22 @@ TEST(IsValidVideo, H264InvalidParameters)
     }
 }
 
+// A negative length leaves nothing to read: every rule answers as for a frame too short for it.
+TEST(Classification, NegativeLengthReadsNothing)
+{
+    const uint8_t frame[] = {0, 0, 0, 1, 0x65, 0x88, 0x84, 0x00, 0x10};
+    const uint8_t seq[4] = {0, 0, 0, 0};
+    for (uint32_t oti : {kMpeg4, kMpeg4b, kH263, kH264, kH263Family, kIntraOnly, kMpeg12, kWmv1, kWmv3}) {
+        const CALParam extra = oti == kWmv3 ? reinterpret_cast<CALParam>(seq) : 4;
+        EXPECT_EQ(vorCALTools_IsIDRFrame(oti, frame, -1, extra), oti == kIntraOnly ? 1 : 0) << std::hex << oti;
+        EXPECT_EQ(vorCALTools_IsBFrame(oti, frame, -1), 0);
+        const bool checked = oti == kMpeg4 || oti == kMpeg4b || oti == kH263 || oti == kH264;
+        EXPECT_EQ(vorCALTools_IsValidVideo(oti, frame, -1), checked ? 0 : 1) << std::hex << oti;
+    }
+    int32_t remaining = 5;
+    EXPECT_EQ(_PTOOL_FindVOP(frame, INT32_MIN, &remaining), nullptr);
+}
+
 TEST(FindVOP, Examples)
 {
     const Bytes withVos = {0, 0, 1, 0xB0, 0x01, 0, 0, 1, 0xB6, 0x10, 0x20};

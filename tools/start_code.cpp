@@ -1,22 +1,229 @@
+// Start-code search: 64-byte strides and then blocks are screened with vector compares (AVX2,
+// SSE2 or NEON, chosen at compile time) or 8-byte words, and only positions that can begin
+// 00 00 01 are checked byte by byte.
 #include "tools/start_code.hpp"
+
+#include <bit>
+#include <cstring>
+
+#if defined(__AVX2__) || defined(__SSE2__)
+#include <immintrin.h>
+#elif defined(__ARM_NEON)
+#include <arm_neon.h>
+#endif
 
 namespace vorcal::tools {
 
-size_t FindStartCodePrefix(const uint8_t *pData, size_t uFrom, size_t uEnd) noexcept
+namespace {
+
+inline bool PrefixAt(const uint8_t *p) noexcept
 {
-    if (uEnd < 3)
-        return uEnd;
-    // The byte two ahead decides how far to move: anything above 1 cannot end a prefix soon.
-    for (size_t i = uFrom; i + 2 < uEnd;) {
-        const uint8_t c = pData[i + 2];
-        if (c > 1)
-            i += 3;
-        else if (c == 1 && pData[i] == 0 && pData[i + 1] == 0)
-            return i;
-        else
-            ++i;
+    return p[0] == 0 && p[1] == 0 && p[2] == 1;
+}
+
+// The per-architecture layer: a block type Vec of kBlock bytes with Load and Store, the
+// candidate mask of one block (bit k when position k may begin a prefix; positions whose
+// prefix would reach into the next block are kept on their zero bytes alone), and for the
+// stride screen below LaneMask, Min and AnyZeroLane.
+#if defined(__AVX2__)
+using Vec = __m256i;
+constexpr size_t kBlock = 32;
+inline Vec Load(const uint8_t *p) noexcept { return _mm256_loadu_si256(reinterpret_cast<const Vec *>(p)); }
+inline void Store(uint8_t *q, Vec v) noexcept { _mm256_storeu_si256(reinterpret_cast<Vec *>(q), v); }
+inline uint32_t Candidates(Vec v) noexcept
+{
+    const uint32_t z = static_cast<uint32_t>(_mm256_movemask_epi8(_mm256_cmpeq_epi8(v, _mm256_setzero_si256())));
+    const uint32_t o = static_cast<uint32_t>(_mm256_movemask_epi8(_mm256_cmpeq_epi8(v, _mm256_set1_epi8(1))));
+    return z & ((z >> 1) | 0x80000000u) & ((o >> 2) | 0xC0000000u);
+}
+inline Vec LaneMask(Vec v) noexcept { return _mm256_and_si256(v, _mm256_set1_epi16(static_cast<short>(0xFEFF))); }
+inline Vec Min(Vec a, Vec b) noexcept { return _mm256_min_epu8(a, b); }
+inline bool AnyZeroLane(Vec v) noexcept { return _mm256_movemask_epi8(_mm256_cmpeq_epi16(v, _mm256_setzero_si256())) != 0; }
+constexpr size_t kStride = 64;
+#elif defined(__SSE2__)
+using Vec = __m128i;
+constexpr size_t kBlock = 16;
+inline Vec Load(const uint8_t *p) noexcept { return _mm_loadu_si128(reinterpret_cast<const Vec *>(p)); }
+inline void Store(uint8_t *q, Vec v) noexcept { _mm_storeu_si128(reinterpret_cast<Vec *>(q), v); }
+inline uint32_t Candidates(Vec v) noexcept
+{
+    const uint32_t z = static_cast<uint32_t>(_mm_movemask_epi8(_mm_cmpeq_epi8(v, _mm_setzero_si128())));
+    const uint32_t o = static_cast<uint32_t>(_mm_movemask_epi8(_mm_cmpeq_epi8(v, _mm_set1_epi8(1))));
+    return z & ((z >> 1) | 0x8000u) & ((o >> 2) | 0xC000u);
+}
+inline Vec LaneMask(Vec v) noexcept { return _mm_and_si128(v, _mm_set1_epi16(static_cast<short>(0xFEFF))); }
+inline Vec Min(Vec a, Vec b) noexcept { return _mm_min_epu8(a, b); }
+inline bool AnyZeroLane(Vec v) noexcept { return _mm_movemask_epi8(_mm_cmpeq_epi16(v, _mm_setzero_si128())) != 0; }
+constexpr size_t kStride = 64;
+#elif defined(__ARM_NEON)
+// NEON has no byte movemask: a block with any zero byte makes every position a candidate,
+// which the byte check then sorts out (rare in coded slice data).
+using Vec = uint8x16_t;
+constexpr size_t kBlock = 16;
+inline Vec Load(const uint8_t *p) noexcept { return vld1q_u8(p); }
+inline void Store(uint8_t *q, Vec v) noexcept { vst1q_u8(q, v); }
+inline bool AnyNonZero(uint8x16_t v) noexcept
+{
+    const uint64x2_t w = vreinterpretq_u64_u8(v);
+    return (vgetq_lane_u64(w, 0) | vgetq_lane_u64(w, 1)) != 0;
+}
+inline uint32_t Candidates(Vec v) noexcept { return AnyNonZero(vceqq_u8(v, vdupq_n_u8(0))) ? 0xFFFFu : 0u; }
+inline Vec LaneMask(Vec v) noexcept { return vandq_u8(v, vreinterpretq_u8_u16(vdupq_n_u16(0xFEFF))); }
+inline Vec Min(Vec a, Vec b) noexcept { return vminq_u8(a, b); }
+inline bool AnyZeroLane(Vec v) noexcept
+{
+    return AnyNonZero(vreinterpretq_u8_u16(vceqq_u16(vreinterpretq_u16_u8(v), vdupq_n_u16(0))));
+}
+constexpr size_t kStride = 64;
+#else
+// Portable: an 8-byte word, a candidate wherever it holds a zero byte; no stride screen.
+using Vec = uint64_t;
+constexpr size_t kBlock = 8;
+inline Vec Load(const uint8_t *p) noexcept
+{
+    Vec w;
+    memcpy(&w, p, sizeof w);
+    return w;
+}
+inline void Store(uint8_t *q, Vec w) noexcept { memcpy(q, &w, sizeof w); }
+inline uint32_t Candidates(Vec w) noexcept
+{
+    const uint64_t kOnes = 0x0101010101010101ull;
+    return ((w - kOnes) & ~w & (kOnes << 7)) != 0 ? 0xFFu : 0u;
+}
+// Never called (no stride screen); declared for the generic code.
+[[maybe_unused]] inline Vec LaneMask(Vec w) noexcept { return w; }
+[[maybe_unused]] inline Vec Min(Vec a, Vec) noexcept { return a; }
+[[maybe_unused]] inline bool AnyZeroLane(Vec) noexcept { return true; }
+constexpr size_t kStride = 0;
+#endif
+
+static_assert(kStride == 0 || kStride == 2 * kBlock || kStride == 4 * kBlock, "a stride is two or four blocks");
+
+// One block loaded (and copied to q + k when kCopy).
+template <bool kCopy>
+inline Vec LoadBlock(const uint8_t *p, uint8_t *q, size_t k) noexcept
+{
+    const Vec v = Load(p + k);
+    if constexpr (kCopy)
+        Store(q + k, v);
+    return v;
+}
+
+// First candidate of the block at p that really begins a prefix, or kBlock. The block plus
+// two bytes must be readable.
+inline size_t CheckCandidates(const uint8_t *p, uint32_t m) noexcept
+{
+    for (; m != 0; m &= m - 1) {
+        const size_t k = static_cast<size_t>(std::countr_zero(m));
+        if (PrefixAt(p + k))
+            return k;
+    }
+    return kBlock;
+}
+
+// First prefix beginning in the block at p, or kBlock.
+template <bool kCopy>
+inline size_t ScanBlock(const uint8_t *p, uint8_t *q) noexcept
+{
+    const uint32_t m = Candidates(LoadBlock<kCopy>(p, q, 0));
+    return m != 0 ? CheckCandidates(p, m) : kBlock;
+}
+
+// Stride screen (64 bytes): a prefix at an even offset of the stride makes a 16-bit lane
+// 00 00, at an odd offset the next lane holds 00 01; both are "lane AND FE FF is zero". A
+// byte-wise minimum over the blocks keeps every such lane at zero (and seldom makes others
+// zero, which the blocks then drop). A prefix at the last offset has its 00 01 outside the
+// stride and is tested apart. Reads p[0..64]; true when the stride needs a closer look.
+template <bool kCopy>
+inline bool StrideMayHoldPrefix(const uint8_t *p, uint8_t *q) noexcept
+{
+    if constexpr (kStride == 0) {
+        return true;
+    } else {
+        auto lanes = [&](size_t b) { return LaneMask(LoadBlock<kCopy>(p, q, b * kBlock)); };
+        // A minimum tree, not a chain through the stride.
+        Vec m = Min(lanes(0), lanes(1));
+        if constexpr (kStride == 4 * kBlock)
+            m = Min(m, Min(lanes(2), lanes(3)));
+        return AnyZeroLane(m) || (p[kStride - 1] | p[kStride]) == 0;
+    }
+}
+
+// First prefix beginning in the stride at p, or kStride. The stride plus two bytes must be
+// readable.
+[[maybe_unused]] inline size_t FindInStride(const uint8_t *p) noexcept
+{
+    for (size_t b = 0; b < kStride; b += kBlock) {
+        const size_t k = ScanBlock<false>(p + b, nullptr);
+        if (k != kBlock)
+            return b + k;
+    }
+    return kStride;
+}
+
+// The search from i while whole strides, then whole blocks, fit below uStop (and are copied
+// to pDst + (position - uFrom) when kCopy). Returns the prefix found or uEnd; i is left at
+// the first position not yet examined.
+template <bool kCopy>
+inline size_t ScanWhole(const uint8_t *pData, size_t &i, size_t uFrom, size_t uStop, size_t uEnd, uint8_t *pDst) noexcept
+{
+    if constexpr (kStride != 0) {
+        for (; i + kStride <= uStop; i += kStride) {
+            if (StrideMayHoldPrefix<kCopy>(pData + i, kCopy ? pDst + (i - uFrom) : nullptr)) {
+                const size_t k = FindInStride(pData + i);
+                if (k != kStride)
+                    return i + k;
+            }
+        }
+    }
+    for (; i + kBlock <= uStop; i += kBlock) {
+        const size_t k = ScanBlock<kCopy>(pData + i, kCopy ? pDst + (i - uFrom) : nullptr);
+        if (k != kBlock)
+            return i + k;
     }
     return uEnd;
+}
+
+} // namespace
+
+size_t FindStartCodePrefix(const uint8_t *pData, size_t uFrom, size_t uEnd) noexcept
+{
+    if (uEnd < 3 || uFrom >= uEnd - 2)
+        return uEnd;
+    const size_t uLast = uEnd - 2; // a prefix begins below uLast
+    size_t i = uFrom;
+    const size_t r = ScanWhole<false>(pData, i, uFrom, uLast, uEnd, nullptr);
+    if (r != uEnd)
+        return r;
+    for (; i < uLast; ++i) {
+        if (PrefixAt(pData + i))
+            return i;
+    }
+    return uEnd;
+}
+
+size_t FindStartCodePrefixCopy(const uint8_t *pData, size_t uFrom, size_t uEnd, uint8_t *pDst,
+                               size_t uDstRoom) noexcept
+{
+    size_t i = uFrom;
+    if (uEnd >= 3 && uFrom < uEnd - 2) {
+        // Whole strides and blocks while both the source and the room allow.
+        const size_t uLast = uEnd - 2;
+        const size_t uStop = uDstRoom < uLast - uFrom ? uFrom + uDstRoom : uLast;
+        const size_t r = ScanWhole<true>(pData, i, uFrom, uStop, uEnd, pDst);
+        if (r != uEnd)
+            return r;
+    }
+    // The tail (or a destination too short for whole blocks): plain search, then one copy.
+    const size_t r = FindStartCodePrefix(pData, i, uEnd);
+    const size_t uCopyEnd = r < uEnd ? r : uEnd;
+    if (uCopyEnd > i && i - uFrom < uDstRoom) {
+        const size_t n = uCopyEnd - i;
+        const size_t uRoom = uDstRoom - (i - uFrom);
+        memcpy(pDst + (i - uFrom), pData + i, n < uRoom ? n : uRoom);
+    }
+    return r;
 }
 
 } // namespace vorcal::tools

@@ -1,17 +1,306 @@
 // Video decoder adaptation: the layer's own work for H.264, MPEG-4 Visual and H.263 streams.
+//
+// Input the layer cannot read is never handed to a tool: a configuration or frame with a null
+// pointer or a negative length is passed to the codec as the engine gave it (for Init the
+// size, profile and level tests then see an empty configuration). The caller's out-arguments
+// (picture size, result word) are written only when they are not null.
 #include "wrapper/video_adapt.hpp"
+
+#include <cstdint>
+
+#include <vorcal/video_tools.h>
+
+#include "core/sal.hpp"
+#include "wrapper/codec_slots.hpp"
 
 namespace vorcal::wrapper {
 
-VideoInitPlan PrepareVideoInit(CALCodec * /*hCodec*/, VideoInitArgs & /*args*/) noexcept
+namespace {
+
+// The intermediate buffer is allocated 100 bytes larger than its payload capacity, and the
+// converter is told the input length plus the same headroom.
+inline constexpr int32_t kIntermediateHeadroom = 100;
+inline constexpr int32_t kMaxIntermediatePayload = INT32_MAX - kIntermediateHeadroom;
+
+inline constexpr uint32_t kProfileMain = 77;          // profile_idc of Main profile
+inline constexpr uint32_t kMPEG4Level3 = 3;
+inline constexpr uint32_t kMPEG4Unrecognised = 255;   // profile and level not in the table
+inline constexpr uint32_t kH263ExtendedPType = 7;     // source format of PLUSPTYPE pictures
+
+inline bool Readable(const uint8_t *pData, int32_t iLen) noexcept
 {
+    return pData && iLen > 0;
+}
+
+inline bool IsAVCFormat(uint32_t uFormat) noexcept
+{
+    return uFormat == CAL_AVC_FORMAT_NAL || uFormat == CAL_AVC_FORMAT_ANNEXB;
+}
+
+inline void Store(uint32_t *puOut, uint32_t uValue) noexcept
+{
+    if (puOut)
+        *puOut = uValue;
+}
+
+inline void StoreSize(const VideoInitArgs &args, uint32_t uWidth, uint32_t uHeight) noexcept
+{
+    Store(args.puWidth, uWidth);
+    Store(args.puHeight, uHeight);
+    Store(args.puPitch, uWidth); // the pitch is the width
+}
+
+// Makes the intermediate buffer hold at least iLen payload bytes. It only grows: a longer input
+// frees the old buffer (when both pointer and capacity are set) before the new one is made, so
+// a failed allocation leaves no buffer (pointer null, capacity 0). False when no buffer of that
+// size is available.
+bool ReserveIntermediate(CALCodec *hCodec, int32_t iLen) noexcept
+{
+    if (iLen > hCodec->m_iIntermediateFrameSize) {
+        if (iLen > kMaxIntermediatePayload)
+            return false;
+        if (hCodec->m_pIntermediateFrame && hCodec->m_iIntermediateFrameSize != 0)
+            sal::Free(hCodec->m_pIntermediateFrame);
+        hCodec->m_pIntermediateFrame =
+            static_cast<uint8_t *>(sal::Alloc(static_cast<uint32_t>(iLen + kIntermediateHeadroom)));
+        hCodec->m_iIntermediateFrameSize = hCodec->m_pIntermediateFrame ? iLen : 0;
+    }
+    // An empty input grows nothing; with no buffer made yet there is nothing to convert into.
+    return hCodec->m_pIntermediateFrame != nullptr;
+}
+
+// The answer the layer gives itself instead of calling the codec.
+inline VideoInitPlan Answer(int32_t iResult) noexcept
+{
+    VideoInitPlan plan;
+    plan.bAnswered = true;
+    plan.iResult = iResult;
+    return plan;
+}
+
+// No memory for a conversion: Init fails with -1 before the codec is called and, like an Init
+// the codec failed, leaves neither buffer behind.
+VideoInitPlan FailInit(CALCodec *hCodec, uint8_t *pTemporaryConfig) noexcept
+{
+    if (pTemporaryConfig)
+        sal::Free(pTemporaryConfig);
+    if (hCodec->m_pIntermediateFrame && hCodec->m_iIntermediateFrameSize != 0) {
+        sal::Free(hCodec->m_pIntermediateFrame);
+        hCodec->m_pIntermediateFrame = nullptr;
+        hCodec->m_iIntermediateFrameSize = 0;
+    }
+    return Answer(-1);
+}
+
+VideoInitPlan PrepareH264Init(CALCodec *hCodec, VideoInitArgs &args) noexcept
+{
+    // The configuration as the caller passed it, parsed at most once for size and profile.
+    CALSPSInfo sps{};
+    bool bParsed = false;
+    bool bParsedOK = false;
+    auto ParseSPS = [&]() noexcept {
+        if (!bParsed) {
+            bParsed = true;
+            bParsedOK = Readable(args.pConfig, args.iConfigLen) &&
+                        vorCALTools_AVC_GetSPSInfo(args.pConfig, args.iConfigLen, &sps) == 0;
+        }
+        return bParsedOK;
+    };
+
+    if (VideoPropertyIs(hCodec, CAL_PROP_STREAM_PARAMETERS, 1) && ParseSPS())
+        StoreSize(args, sps.uWidth, sps.uHeight);
+
+    if (VideoPropertyIs(hCodec, CAL_PROP_H264_NO_MAIN_PROFILE, 1) && ParseSPS() && sps.uProfile == kProfileMain) {
+        VORCAL_TRACE(kTraceError, 0,
+                     "[CAL_Wrapper %d] H.264 Error(Profile[%u], Level[%u])!!! H.264 codec can't support "
+                     "profile[Main Profile]\n",
+                     __LINE__, sps.uProfile, sps.uLevel);
+        return Answer(CAL_RESULT_REFUSED);
+    }
+
+    uint32_t uWanted = 0;
+    if (!VideoPropertyAnswered(hCodec, CAL_PROP_H264_CONFIG_FORMAT, &uWanted))
+        return {};
+    hCodec->m_uH264NALSize = args.uNALLengthSize;
+    if (!IsAVCFormat(uWanted))
+        return {};
+
+    VideoInitPlan plan;
+    const int32_t iWanted = static_cast<int32_t>(uWanted);
+
+    // Parameter sets: a temporary buffer of 3/2 of the input, freed after the codec's Init.
+    if (Readable(args.pConfig, args.iConfigLen) &&
+        vorCALTools_AVC_CheckFormat(args.pConfig, args.iConfigLen) != iWanted) {
+        const int64_t iSize = (static_cast<int64_t>(args.iConfigLen) * 3) / 2;
+        if (iSize > INT32_MAX)
+            return FailInit(hCodec, nullptr);
+        plan.pTemporaryConfig = static_cast<uint8_t *>(sal::Alloc(static_cast<uint32_t>(iSize)));
+        if (!plan.pTemporaryConfig)
+            return FailInit(hCodec, nullptr);
+        args.iConfigLen = vorCALTools_AVC_ConvertFormatPSs(plan.pTemporaryConfig, static_cast<int32_t>(iSize),
+                                                           args.pConfig, args.iConfigLen);
+        args.pConfig = plan.pTemporaryConfig;
+    }
+
+    // Enhancement configuration: converted into the intermediate buffer.
+    if (Readable(args.pConfigEnhance, args.iEnhLen) &&
+        vorCALTools_AVC_CheckFormat(args.pConfigEnhance, args.iEnhLen) != iWanted) {
+        if (!ReserveIntermediate(hCodec, args.iEnhLen))
+            return FailInit(hCodec, plan.pTemporaryConfig);
+        const int32_t iNewLen = vorCALTools_AVC_ConvertFormat(
+            hCodec->m_pIntermediateFrame, args.iEnhLen + kIntermediateHeadroom, args.pConfigEnhance,
+            args.iEnhLen, static_cast<int32_t>(args.uNALLengthSize));
+        if (iNewLen == -1) {
+            // The message names the format test, although the conversion failed; the codec
+            // gets no enhancement configuration but the length as the caller gave it.
+            VORCAL_TRACE(kTraceError, 0, "[CAL_Wrapper %d] vorCALTools_AVC_CheckFormat failed\n", __LINE__);
+            args.pConfigEnhance = nullptr;
+        } else {
+            args.pConfigEnhance = hCodec->m_pIntermediateFrame;
+            args.iEnhLen = iNewLen;
+            VORCAL_TRACE(kTraceH264Adapt, 0,
+                         "[CAL_Wrapper %d] vorCALTools_AVC_CheckFormat iEnhLen = %d, iNewDataLen = %d\n",
+                         __LINE__, iNewLen, iNewLen);
+            VORCAL_TRACE(kTraceH264Adapt, 0,
+                         "[CAL_Wrapper %d] vorCALTools_AVC_CheckFormat pConfigEnhance = 0x%x, "
+                         "m_pIntermediateFrame = 0x%x, m_uH264NALSize = %d\n",
+                         __LINE__, sal::Hex32(args.pConfigEnhance), sal::Hex32(hCodec->m_pIntermediateFrame),
+                         static_cast<int>(hCodec->m_uH264NALSize));
+        }
+    }
+    return plan;
+}
+
+VideoInitPlan PrepareMPEG4Init(CALCodec *hCodec, const VideoInitArgs &args) noexcept
+{
+    // Cleared first: fields of headers the DSI does not carry read as 0.
+    CALMPEG4DSIInfo dsi{};
+    const uint32_t uDSILen = Readable(args.pConfig, args.iConfigLen) ? static_cast<uint32_t>(args.iConfigLen) : 0;
+    const bool bParsedOK = vorCALTools_MPEG4V_GetDSIInfo(args.pConfig, uDSILen, &dsi) == 0;
+
+    if (VideoPropertyIs(hCodec, CAL_PROP_STREAM_PARAMETERS, 1) && bParsedOK)
+        StoreSize(args, dsi.uWidth, dsi.uHeight);
+
+    if (args.uOTI == CAL_OTI_MPEG4_VISUAL) {
+        // Both refusals read the record whether or not the walk succeeded; an unrecognised
+        // profile is reported with the level-3 message as well.
+        const bool bRefused =
+            (VideoPropertyIs(hCodec, CAL_PROP_MPEG4_NO_LEVEL3, 1) && dsi.uLevel == kMPEG4Level3) ||
+            (VideoPropertyIs(hCodec, CAL_PROP_MPEG4_NO_UNKNOWN_PROFILE, 1) && dsi.uProfile == kMPEG4Unrecognised &&
+             dsi.uLevel == kMPEG4Unrecognised);
+        if (bRefused) {
+            VORCAL_TRACE(kTraceError, 0,
+                         "[CAL_Wrapper %d] MPEG4 Error(Profile[%u], Level[%u])!!! MPEG4 codec can't support "
+                         "Level 3.\n",
+                         __LINE__, dsi.uProfile, dsi.uLevel);
+            return Answer(CAL_RESULT_REFUSED);
+        }
+    } else if (bParsedOK && dsi.uSourceFormat == kH263ExtendedPType &&
+               VideoPropertyIs(hCodec, CAL_PROP_H263_NO_EXTENDED_PTYPE, 1)) {
+        VORCAL_TRACE(kTraceError, 0,
+                     "[CAL_Wrapper %d] H.263 Error(Type[%d])!!! H.263 codec can't support H.263 Extended P Type\n",
+                     __LINE__, static_cast<int>(dsi.uSourceFormat));
+        return Answer(CAL_RESULT_REFUSED);
+    }
     return {};
 }
 
-bool AdaptVideoFrame(CALCodec * /*hCodec*/, VideoFrame & /*frame*/, CALParam /*uParam3*/,
-                     uint32_t * /*puDecodeResult*/, int32_t * /*piResult*/) noexcept
+// The layer drops the frame itself: result 1 and, when the caller gave one, result word 4.
+inline bool Drop(uint32_t *puDecodeResult, int32_t *piResult) noexcept
 {
+    Store(puDecodeResult, CAL_DECODE_RESULT_DROPPED);
+    *piResult = CAL_RESULT_DROPPED;
+    return false;
+}
+
+bool AdaptH264Frame(CALCodec *hCodec, VideoFrame &frame, CALParam uParam3, uint32_t *puDecodeResult,
+                    int32_t *piResult) noexcept
+{
+    const int32_t iNALSize = static_cast<int32_t>(hCodec->m_uH264NALSize);
+
+    // In-band parameter sets: cut the SEI/SPS/PPS run and everything in front of it. The format
+    // test takes a 4-byte length of 0x100 to 0x1FF (00 00 01 xx) for a start code, so such a
+    // length-prefixed frame is searched, and later converted, as start-code framed.
+    uint32_t uValue = 0;
+    if (VideoPropertyAnswered(hCodec, CAL_PROP_H264_INBAND_PARAM_SETS, &uValue) && uValue == 0) {
+        const bool bAnnexB = vorCALTools_AVC_CheckFormat(frame.pData, frame.iLen) == CAL_AVC_FORMAT_ANNEXB;
+        int32_t iRunLen = 0;
+        const uint8_t *pRun = bAnnexB ? vorCALTools_AVC_ANNEXB_GetConfigStream(frame.pData, frame.iLen, &iRunLen)
+                                      : vorCALTools_AVC_NAL_GetConfigStream(frame.pData, frame.iLen, iNALSize, &iRunLen);
+        if (pRun) {
+            const int32_t iNewLen = frame.iLen - iRunLen - static_cast<int32_t>(pRun - frame.pData);
+            VORCAL_TRACE(kTraceH264Adapt, 4, "[CAL_Wrapper %d] %s bitstream has SPSPPS. => => Discard SPSPPS\n",
+                         __LINE__, bAnnexB ? "ANNEX-B" : "NAL");
+            if (iNewLen <= 3) {
+                VORCAL_TRACE(kTraceH264Adapt, 0, "[CAL_Wrapper %d] InValid Frame Len (%d)\n", __LINE__, iNewLen);
+                return Drop(puDecodeResult, piResult);
+            }
+            frame.pData = pRun + iRunLen;
+            frame.iLen = iNewLen;
+        }
+    }
+
+    // Framing: rewrite into the intermediate buffer when the codec wants the other one.
+    uint32_t uWanted = 0;
+    if (VideoPropertyAnswered(hCodec, CAL_PROP_H264_FRAME_FORMAT, &uWanted) && IsAVCFormat(uWanted) &&
+        vorCALTools_AVC_CheckFormat(frame.pData, frame.iLen) != static_cast<int32_t>(uWanted)) {
+        if (!ReserveIntermediate(hCodec, frame.iLen))
+            return Drop(puDecodeResult, piResult);
+        const int32_t iNewLen = vorCALTools_AVC_ConvertFormat(hCodec->m_pIntermediateFrame,
+                                                              frame.iLen + kIntermediateHeadroom, frame.pData,
+                                                              frame.iLen, iNALSize);
+        if (iNewLen == -1)
+            VORCAL_TRACE(kTraceError, 0, "[CAL_Wrapper %d] vorCALTools_AVC_ConvertFormat failed[%d],iLen[%d]\n",
+                         __LINE__, static_cast<int>(uParam3), frame.iLen);
+        if (iNewLen < 0)
+            return Drop(puDecodeResult, piResult);
+        frame.pData = hCodec->m_pIntermediateFrame;
+        frame.iLen = iNewLen;
+    }
     return true;
+}
+
+void AdaptMPEG4Frame(CALCodec *hCodec, VideoFrame &frame) noexcept
+{
+    if (!VideoPropertyIs(hCodec, CAL_PROP_MPEG4_VOP_START, 1))
+        return;
+    int32_t iRemaining = 0;
+    if (const uint8_t *pVOP = _PTOOL_FindVOP(frame.pData, frame.iLen, &iRemaining)) {
+        frame.pData = pVOP;
+        frame.iLen = iRemaining;
+    }
+}
+
+} // namespace
+
+VideoInitPlan PrepareVideoInit(CALCodec *hCodec, VideoInitArgs &args) noexcept
+{
+    switch (args.uOTI) {
+    case CAL_OTI_H264:
+        return PrepareH264Init(hCodec, args);
+    case CAL_OTI_MPEG4_VISUAL:
+    case CAL_OTI_H263:
+        return PrepareMPEG4Init(hCodec, args);
+    default:
+        return {};
+    }
+}
+
+bool AdaptVideoFrame(CALCodec *hCodec, VideoFrame &frame, CALParam uParam3, uint32_t *puDecodeResult,
+                     int32_t *piResult) noexcept
+{
+    // A frame the layer cannot read goes to the codec as the engine passed it.
+    if (!frame.pData || frame.iLen < 0)
+        return true;
+    switch (hCodec->m_uCodecObjectTypeIndication) {
+    case CAL_OTI_H264:
+        return AdaptH264Frame(hCodec, frame, uParam3, puDecodeResult, piResult);
+    case CAL_OTI_MPEG4_VISUAL:
+        AdaptMPEG4Frame(hCodec, frame);
+        return true;
+    default:
+        return true;
+    }
 }
 
 } // namespace vorcal::wrapper

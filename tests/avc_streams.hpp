@@ -1,0 +1,70 @@
+// Builders for H.264 test streams: units framed with start codes or length fields, and
+// hand-made SPS, PPS and slice units whose fields stay visible in the test.
+#pragma once
+
+#include <cstdint>
+#include <initializer_list>
+#include <vector>
+
+#include "bit_writer.hpp"
+
+namespace vorcal::test {
+
+using Bytes = std::vector<uint8_t>;
+
+inline Bytes Cat(std::initializer_list<Bytes> parts)
+{
+    Bytes out;
+    for (const Bytes &p : parts)
+        out.insert(out.end(), p.begin(), p.end());
+    return out;
+}
+
+// Units behind start codes of the given lengths (3 or 4), cycling through the list.
+inline Bytes AnnexB(std::initializer_list<Bytes> units, std::initializer_list<int> codeLengths = {4})
+{
+    Bytes out;
+    auto code = codeLengths.begin();
+    for (const Bytes &u : units) {
+        if (*code == 4)
+            out.push_back(0);
+        out.insert(out.end(), {0, 0, 1});
+        out.insert(out.end(), u.begin(), u.end());
+        if (++code == codeLengths.end())
+            code = codeLengths.begin();
+    }
+    return out;
+}
+
+// Units behind big-endian length fields of `size` bytes.
+inline Bytes LengthPrefixed(std::initializer_list<Bytes> units, int size)
+{
+    Bytes out;
+    for (const Bytes &u : units) {
+        for (int k = size - 1; k >= 0; --k)
+            out.push_back(static_cast<uint8_t>(u.size() >> (8 * k)));
+        out.insert(out.end(), u.begin(), u.end());
+    }
+    return out;
+}
+
+// A slice unit: first_mb_in_slice, slice_type, pic_parameter_set_id, then `key` as a ue(v) in
+// the place of frame_num (what separates pictures for vorCALTools_AVC_GetOneFrame).
+inline Bytes Slice(uint8_t header, uint32_t key, size_t payload = 6)
+{
+    BitWriter w;
+    w.PutUE(0).PutUE(header == 0x65 ? 7 : 5).PutUE(0).PutUE(key).Trailing();
+    Bytes body = w.Bytes();
+    for (size_t i = 0; i < payload; ++i)
+        body.push_back(static_cast<uint8_t>(0x80 + i));
+    Bytes out{header};
+    Bytes escaped = BitWriter::Escape(body);
+    out.insert(out.end(), escaped.begin(), escaped.end());
+    return out;
+}
+
+inline const Bytes kSps{0x67, 0x42, 0xC0, 0x1E, 0xDA, 0x02, 0x80, 0xBF, 0xE5};
+inline const Bytes kPps{0x68, 0xCE, 0x38, 0x80};
+inline const Bytes kSei{0x06, 0x05, 0x02, 0xAA, 0xBB, 0x80};
+
+} // namespace vorcal::test

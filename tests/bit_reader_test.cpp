@@ -128,11 +128,14 @@ TEST(BitReader, EndIsReportedByTheLoadOfTheLastByte)
     EXPECT_EQ(_ShiftBytes(&bs, 2), 1);
     EXPECT_EQ(bs.uNextByte, 6u);
     EXPECT_EQ(bs.uCache, 0x03040506u); // its bits are still unread
-    // A skip stops at the first load that reports the end (one load here, not two), and
-    // loads past the end supply zeros.
+    // Once the end is reached, skips and reads still report it, the bits still inside the
+    // buffer keep their place and everything past the end reads as zeros.
     EXPECT_EQ(_ShiftBits(&bs, 16), 1);
-    EXPECT_EQ(_ReadNShiftBits(&bs, 16), 0x0405u);
-    EXPECT_EQ(_ReadNShiftBits(&bs, 16), 0x0506u); // again one load only
+    EXPECT_EQ(_ReadNShiftBits(&bs, 16), 0x0506u);
+    EXPECT_EQ(_ReadNShiftBits(&bs, 16), 0x0000u);
+    EXPECT_EQ(_ShiftBits(&bs, 0xFFFFFFFFu), 1); // a huge skip past the end returns at once
+    EXPECT_EQ(_ShiftBytes(&bs, 0x7FFFFFFF), 1);
+    EXPECT_EQ(_ReadNShiftBits(&bs, 8), 0u);
 }
 
 TEST(BitReader, EscapeInTheLastPositionReadsNothingBeyond)

@@ -48,17 +48,30 @@ inline uint32_t Peek(const CALToolsBS &bs) noexcept
     return bs.uCache << bs.uBitPos;
 }
 
-// Consumes n bits: loads (bit position + n) / 8 bytes, stopping at the first load that reports
-// the end. True when such a load was made.
+// Makes uLoads loads; true when any of them reported the end. Past the end the loads go on
+// supplying zero bytes, so that the cache always matches the bit position: bits inside the
+// buffer stay the buffer's and bits past it read as zeros.
+inline bool LoadMany(CALToolsBS &bs, uint64_t uLoads) noexcept
+{
+    bool bEnd = false;
+    for (; uLoads != 0; --uLoads) {
+        if (bs.uCache == 0 && bs.uNextByte >= bs.uLength) {
+            // Only zeros are left to load: move the index without touching anything.
+            const uint64_t uNext = uint64_t{bs.uNextByte} + uLoads;
+            bs.uNextByte = uNext > UINT32_MAX ? UINT32_MAX : static_cast<uint32_t>(uNext);
+            return true;
+        }
+        bEnd |= Load(bs);
+    }
+    return bEnd;
+}
+
+// Consumes n bits: loads (bit position + n) / 8 bytes. True when a load reached the end.
 inline bool Skip(CALToolsBS &bs, uint32_t n) noexcept
 {
     const uint64_t uTotal = uint64_t{bs.uBitPos} + n;
     bs.uBitPos = static_cast<uint32_t>(uTotal & 7);
-    for (uint64_t uLoads = uTotal >> 3; uLoads != 0; --uLoads) {
-        if (Load(bs))
-            return true;
-    }
-    return false;
+    return LoadMany(bs, uTotal >> 3);
 }
 
 // The next n bits right-aligned; exact while n + bit position <= 32, 0 for n = 0 or n > 32.
@@ -92,11 +105,7 @@ inline bool Align(CALToolsBS &bs) noexcept
 // Loads n bytes with the bit position unchanged; true when a load reached the end.
 inline bool SkipBytes(CALToolsBS &bs, int32_t n) noexcept
 {
-    for (int32_t i = 0; i < n; ++i) {
-        if (Load(bs))
-            return true;
-    }
-    return false;
+    return n > 0 && LoadMany(bs, static_cast<uint64_t>(n));
 }
 
 } // namespace vorcal::tools::bs

@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include <tuple>
+
 #include <vorcal/video_tools.h>
 
 #include "avc_streams.hpp"
@@ -83,19 +85,10 @@ SpsFields With(void (*edit)(SpsFields &))
 
 class GetSPSInfo : public testing::TestWithParam<SpsCase> {};
 
-void ExpectInfo(const CALSPSInfo &got, const CALSPSInfo &want)
+auto Fields(const CALSPSInfo &i)
 {
-    EXPECT_EQ(got.uProfile, want.uProfile);
-    EXPECT_EQ(got.uLevel, want.uLevel);
-    EXPECT_EQ(got.uWidth, want.uWidth);
-    EXPECT_EQ(got.uHeight, want.uHeight);
-    EXPECT_EQ(got.uRefFrames, want.uRefFrames);
-    EXPECT_EQ(got.uCropping, want.uCropping);
-    EXPECT_EQ(got.uCropLeft, want.uCropLeft);
-    EXPECT_EQ(got.uCropRight, want.uCropRight);
-    EXPECT_EQ(got.uCropTop, want.uCropTop);
-    EXPECT_EQ(got.uCropBottom, want.uCropBottom);
-    EXPECT_EQ(got.uAspectClass, want.uAspectClass);
+    return std::tuple(i.uProfile, i.uLevel, i.uWidth, i.uHeight, i.uRefFrames, i.uCropping, i.uCropLeft, i.uCropRight,
+                      i.uCropTop, i.uCropBottom, i.uAspectClass);
 }
 
 CALSPSInfo Untouched()
@@ -110,7 +103,7 @@ TEST_P(GetSPSInfo, Fields)
     const Bytes data = Cat({AnnexB({BuildSps(c.fields)}), AnnexB({kPps})});
     CALSPSInfo info = Untouched();
     EXPECT_EQ(vorCALTools_AVC_GetSPSInfo(data.data(), static_cast<int32_t>(data.size()), &info), c.result);
-    ExpectInfo(info, c.expected);
+    EXPECT_EQ(Fields(info), Fields(c.expected));
 }
 
 const uint32_t U = kUntouched;
@@ -121,15 +114,11 @@ INSTANTIATE_TEST_SUITE_P(
         SpsCase{"baseline640x480", SpsFields{}, 0, Info(66, 30, 640, 480, 1, 0, 0, 0, 0, 0, U)},
         SpsCase{"pocType1", With([](SpsFields &f) { f.pocType = 1; f.pocCycleLength = 3; f.pocCycle[1] = -7; f.refFrames = 4; }),
                 0, Info(66, 30, 640, 480, 4, 0, 0, 0, 0, 0, U)},
-        SpsCase{"pocType1EmptyCycle", With([](SpsFields &f) { f.pocType = 1; f.refFrames = 2; }), 0,
-                Info(66, 30, 640, 480, 2, 0, 0, 0, 0, 0, U)},
         SpsCase{"pocType2", With([](SpsFields &f) { f.pocType = 2; f.refFrames = 3; }), 0,
                 Info(66, 30, 640, 480, 3, 0, 0, 0, 0, 0, U)},
         SpsCase{"pocType3", With([](SpsFields &f) { f.pocType = 3; }), 3, Info(66, 30, U, U, U, U, U, U, U, U, U)},
         SpsCase{"cropping1080", With([](SpsFields &f) { f.profile = 77; f.level = 40; f.widthMbsMinus1 = 119; f.heightMapUnitsMinus1 = 67; f.cropping = true; f.crop[3] = 4; }),
                 0, Info(77, 40, 1920, 1088, 1, 1, 0, 0, 0, 4, U)},
-        SpsCase{"cropAllSides", With([](SpsFields &f) { f.cropping = true; f.crop[0] = 1; f.crop[1] = 2; f.crop[2] = 3; f.crop[3] = 300; }),
-                0, Info(66, 30, 640, 480, 1, 1, 1, 2, 3, 300, U)},
         // Field coding: mb_adaptive_frame_field_flag is read; the height stays one field's.
         SpsCase{"fields", With([](SpsFields &f) { f.frameMbsOnly = 0; f.heightMapUnitsMinus1 = 17; }), 0,
                 Info(66, 30, 640, 288, 1, 0, 0, 0, 0, 0, U)},
@@ -138,8 +127,6 @@ INSTANTIATE_TEST_SUITE_P(
                 Info(66, 30, 640, 480, 1, 0, 0, 0, 0, 0, 2)},
         SpsCase{"vuiSar16to16", With([](SpsFields &f) { f.vui = f.aspectInfo = true; f.sarW = 0x110; f.sarH = 0x10; }), 0,
                 Info(66, 30, 640, 480, 1, 0, 0, 0, 0, 0, 4)},
-        SpsCase{"vuiSarOther", With([](SpsFields &f) { f.vui = f.aspectInfo = true; f.sarW = 64; f.sarH = 45; }), 0,
-                Info(66, 30, 640, 480, 1, 0, 0, 0, 0, 0, 1)},
         // aspect_ratio_idc 1 carries no SAR: the two 16-bit reads take what follows.
         SpsCase{"vuiAspectIdcOnly", With([](SpsFields &f) { f.vui = f.aspectInfo = true; f.aspectIdc = 1; }), 0,
                 Info(66, 30, 640, 480, 1, 0, 0, 0, 0, 0, 1)},
@@ -150,20 +137,8 @@ INSTANTIATE_TEST_SUITE_P(
         // Constraint byte and level 0, then six zero bits: 67 42 00 00 03 0x, the escape at
         // unit index 4 (the first index the reader removes).
         SpsCase{"escapeAfterLevel", With([](SpsFields &f) { f.constraints = 0; f.level = 0; f.spsId = 100; }), 0,
-                Info(66, 0, 640, 480, 1, 0, 0, 0, 0, 0, U)},
-        SpsCase{"largeCodes", With([](SpsFields &f) { f.spsId = 4095; f.log2MaxFrameNumMinus4 = 4095; f.refFrames = 4095; f.widthMbsMinus1 = 4095; }),
-                0, Info(66, 30, 65536, 480, 4095, 0, 0, 0, 0, 0, U)}),
+                Info(66, 0, 640, 480, 1, 0, 0, 0, 0, 0, U)}),
     [](const testing::TestParamInfo<SpsCase> &info) { return info.param.name; });
-
-TEST(GetSPSInfo, EscapesArePresentInTheEscapeCase)
-{
-    SpsFields f;
-    f.constraints = f.level = 0;
-    f.spsId = 100;
-    const Bytes sps = BuildSps(f);
-    ASSERT_GE(sps.size(), 5u);
-    EXPECT_EQ(sps[4], 3);
-}
 
 struct SearchCase {
     const char *name;
@@ -194,9 +169,7 @@ INSTANTIATE_TEST_SUITE_P(
                     SearchCase{"threeByteCode", AnnexB({kSps640}, {3}), 0},
                     SearchCase{"anyFirstThreeBytesPassedOver", Cat({{0xAB, 0xCD, 0xEF}, kSps640}), 0},
                     SearchCase{"seiFirst", AnnexB({kSei, kSps640}), 0},
-                    SearchCase{"audSeiFirstMixedCodes", AnnexB({{0x09, 0x10}, kSei, kSps640}, {3, 4}), 0},
                     SearchCase{"forbiddenBit", AnnexB({{0xE7, 0x42, 0xC0, 0x1E}}), 2},
-                    SearchCase{"forbiddenBitLater", AnnexB({kSei, {0xE7, 0x42, 0xC0, 0x1E}}), 2},
                     SearchCase{"onlyPps", AnnexB({{0x68, 0xCE, 0x38, 0x80, 0x11}}), 3},
                     SearchCase{"configurationRecord", {0x01, 0x42, 0xC0, 0x1E, 0xFF, 0xE1, 0x00, 0x04, 0x67, 0x42, 0xC0, 0x1E, 0x01, 0x00, 0x02, 0x68, 0xCE}, 3},
                     // After the next start code only 4 bytes remain.

@@ -97,7 +97,8 @@ int main(int argc, char **argv)
     printf("engine: Init with a %d-byte avcC record\n", (int)sizeof kConfig);
     iInit = vorCAL_VideoDecoderInit(hCodec, CAL_OTI_H264, kConfig, sizeof kConfig, NULL, 0, 4, &uWidth,
                                     &uHeight, &uPitch, 0);
-    printf("engine: Init result %d, picture %ux%u\n", (int)iInit, (unsigned)uWidth, (unsigned)uHeight);
+    printf("engine: Init result %d, picture %ux%u%s\n", (int)iInit, (unsigned)uWidth, (unsigned)uHeight,
+           uWidth ? "" : " (the layer reads the picture size from start-code framed configurations only)");
     for (i = 0; i < 3; ++i) {
         int32_t iResult;
         printf("engine: Decode frame %d (%d bytes, length-prefixed)\n", (int)i, (int)aiLens[i]);

@@ -227,31 +227,6 @@ TEST_F(CoreTest, EveryAllocationCanFail)
     EXPECT_EQ(_CE_New(), nullptr);
 }
 
-TEST_F(CoreTest, EntryListOperations)
-{
-    CALCodecEntry *head = nullptr;
-    CALCodecEntry *a = _CE_New();
-    ASSERT_NE(a, nullptr);
-    EXPECT_EQ(a->pNext, nullptr);
-    EXPECT_EQ(a->Functions[3], nullptr);
-    a->uCodecObjectTypeIndication = 1;
-    EXPECT_EQ(_CE_Add(&head, a), 0);
-    EXPECT_EQ(head, a);
-    CALCodecEntry *b = _CE_New();
-    b->uCodecObjectTypeIndication = 2;
-    EXPECT_EQ(_CE_Add(&head, b), 0);
-    CALCodecEntry *a2 = _CE_New();
-    a2->uCodecObjectTypeIndication = 1;
-    a2->Functions[0] = Fn(9);
-    EXPECT_EQ(_CE_Add(&head, a2), 1);
-    EXPECT_EQ(head, a);
-    EXPECT_EQ(head->Functions[0], Fn(9));
-    EXPECT_EQ(head->pNext, b);
-    EXPECT_EQ(_CE_Find(head, 0, 0, 2), b);
-    EXPECT_EQ(_CE_Find(head, 0, 1, 2), nullptr);
-    _CE_FreeListAll(head);
-}
-
 TEST(Version, StringsAndNumbers)
 {
     EXPECT_STREQ(vorCAL_GetVersion(), "0x00000001.0x00000001.0x00000002.");

@@ -10,6 +10,7 @@ JOBS ?= $(shell nproc 2>/dev/null || echo 2)
 FUZZ_SECONDS ?= 30
 CMAKE_FLAGS ?= -DVORCAL_WERROR=ON
 GENERATOR := $(shell command -v ninja >/dev/null 2>&1 && echo "-G Ninja")
+FUZZ_TARGETS := $(basename $(notdir $(wildcard fuzz/*_fuzzer.cpp)))
 SUDO := $(shell [ "$$(id -u)" = 0 ] || echo sudo)
 
 .PHONY: all build run test check-sanitize check-arm fuzz bench install clean
@@ -46,7 +47,7 @@ check-arm:
 fuzz:
 	CC=clang CXX=clang++ cmake -S . -B build-fuzz $(GENERATOR) $(CMAKE_FLAGS) -DVORCAL_FUZZ=ON \
 	  -DVORCAL_SANITIZE=ON -DVORCAL_BUILD_BENCH=OFF -DVORCAL_BUILD_EXAMPLES=OFF
-	cmake --build build-fuzz -j $(JOBS)
+	cmake --build build-fuzz -j $(JOBS) --target $(FUZZ_TARGETS)
 	sh fuzz/run_all.sh build-fuzz $(FUZZ_SECONDS) $(JOBS)
 
 bench: build

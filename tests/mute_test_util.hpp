@@ -1,20 +1,32 @@
-// Helpers shared by the silence-frame tests: a digest of frame bytes and an owned frame.
+// Helpers shared by the silence-frame and audio adaptation tests.
 #pragma once
 
 #include <cstdint>
+#include <string>
 #include <vector>
 
+#include <vorcal/core.h>
 #include <vorcal/vorsal.h>
+#include <vorcal/wrapper.h>
+
+#include "recording_codec.hpp"
+#include "recording_sal.hpp"
 
 namespace vorcal::test {
 
-// FNV-1a, 32 bits: the digests of the templates were taken from their published hex.
-inline uint32_t Fnv1a(const uint8_t *p, size_t n)
+// True when exactly one level-0 trace of the category reads text ('#' for a line number), its
+// format being the text with every number (and '#') written as %d.
+inline bool HasNumberedTrace(int32_t iCategory, const std::string &text)
 {
-    uint32_t h = 0x811C9DC5u;
-    for (size_t i = 0; i < n; ++i)
-        h = (h ^ p[i]) * 0x01000193u;
-    return h;
+    std::string format;
+    bool bInNumber = false;
+    for (char c : text) {
+        const bool bDigit = c == '#' || (c >= '0' && c <= '9');
+        if (!bDigit || !bInNumber)
+            format += bDigit ? std::string("%d") : std::string(1, c);
+        bInNumber = bDigit;
+    }
+    return HasTrace(iCategory, 0, format, text);
 }
 
 // Copies a generated frame and returns it to the memory table.
@@ -24,5 +36,27 @@ inline std::vector<uint8_t> TakeFrame(uint8_t *pFrame, uint32_t uLen)
     g_vorSALMemoryTable->Free(pFrame);
     return bytes;
 }
+
+// An audio decoder instance of the recording codec under one OTI, released at scope end.
+struct AudioInstance {
+    explicit AudioInstance(uint32_t uOTI)
+    {
+        RecordingCodec::Get().Reset();
+        hCAL = vorCAL_GetHandle(0, 1, 1);
+        const CALAudioDecoderFunctions table = RecordingCodec::AudioDecoder();
+        vorCAL_RegisterCodec(hCAL, 2, 0, uOTI, &table, sizeof table);
+        hCodec = vorCAL_GetCodec(hCAL, 2, 0, uOTI);
+    }
+    ~AudioInstance()
+    {
+        vorCAL_ReleaseCodec(hCodec);
+        vorCAL_ReleaseHandle(hCAL);
+    }
+    CALCodec *get() const { return hCodec; }
+    CALCodec *operator->() const { return hCodec; }
+
+    CALHandle *hCAL = nullptr;
+    CALCodec *hCodec = nullptr;
+};
 
 } // namespace vorcal::test

@@ -1,167 +1,89 @@
 #include <gtest/gtest.h>
 
+#include <functional>
 #include <string>
 #include <vector>
 
 #include <vorcal/audio_tools.h>
 
 #include "mute_test_util.hpp"
-#include "recording_sal.hpp"
 
 using namespace vorcal::test;
 
 namespace {
 
-using Generator = int32_t (*)(uint8_t **, uint32_t *, uint32_t);
-
-struct AmrKind {
-    const char *pName;
-    Generator pGenerate;
-    std::vector<uint32_t> sizes;   // RFC 4867 frame sizes, header byte included
-    std::vector<uint32_t> digests; // of the published templates
-    int iInfoLine;
-    int iErrorLine;
-};
-
-const AmrKind kNb = {"NB", AMRNB_MuteFrame, {13, 14, 16, 18, 20, 21, 27, 32},
-                     {0x85608B38, 0x4AD2E25C, 0xC8C4BF28, 0x8F62BD0B, 0xD94FC280, 0x4BC46A81, 0x774D63E4,
-                      0x034D93F7},
-                     189, 252};
-const AmrKind kWb = {"WB", AMRWB_MuteFrame, {18, 24, 33, 37, 41, 47, 51, 59, 61},
-                     {0xAA5BC1CE, 0x54F8408F, 0xB077DA04, 0xF5DA0D2B, 0xFA4E59CC, 0x4ADC6DC0, 0x7F5111E8,
-                      0x22E08E7C, 0x31A10D1E},
-                     264, 380};
-
-class AmrMute : public testing::TestWithParam<const AmrKind *> {
-protected:
-    void SetUp() override { RecordingSal::Get().Reset(); }
-    void TearDown() override { EXPECT_TRUE(RecordingSal::Get().liveBlocks.empty()); }
-};
-
-TEST_P(AmrMute, EveryFrameTypeIsAWholeStorageFormatFrame)
+// FNV-1a, 32 bits: the digests were taken from the templates' published hex.
+uint32_t Fnv1a(const std::vector<uint8_t> &bytes)
 {
-    const AmrKind &kind = *GetParam();
-    const std::string info = std::string("[AAC_Mute, %d] AMR") + kind.pName + " FT = %d, FrameLen = %d\n";
-    for (uint32_t uFT = 0; uFT < kind.sizes.size(); ++uFT) {
-        SCOPED_TRACE(uFT);
-        RecordingSal::Get().Reset();
-        uint8_t *pFrame = nullptr;
-        uint32_t uLen = 0;
-        ASSERT_EQ(kind.pGenerate(&pFrame, &uLen, uFT), 0);
-        ASSERT_NE(pFrame, nullptr);
-        EXPECT_EQ(RecordingSal::Get().allocSizes, std::vector<uint32_t>{kind.sizes[uFT]});
-        const std::vector<uint8_t> frame = TakeFrame(pFrame, uLen);
-        ASSERT_EQ(frame.size(), kind.sizes[uFT]);
-        EXPECT_EQ(frame[0], (uFT << 3) | 0x04); // FT and Q = 1
-        EXPECT_EQ(Fnv1a(frame.data(), frame.size()), kind.digests[uFT]);
-        EXPECT_TRUE(HasTrace(1, 0, info,
-                             "[AAC_Mute, " + std::to_string(kind.iInfoLine) + "] AMR" + kind.pName +
-                                 " FT = " + std::to_string(uFT) + ", FrameLen = " + std::to_string(frame.size()) +
-                                 "\n"));
-    }
+    uint32_t h = 0x811C9DC5u;
+    for (uint8_t b : bytes)
+        h = (h ^ b) * 0x01000193u;
+    return h;
 }
 
-TEST_P(AmrMute, RefusedFrameTypesAllocateNothing)
-{
-    const AmrKind &kind = *GetParam();
-    const std::string error = std::string("[AAC_Mute, %d] AMR") + kind.pName + "_MuteFrame Error\n";
-    for (uint32_t uFT : {static_cast<uint32_t>(kind.sizes.size()), 15u, 0xFFFFFFFFu}) {
-        RecordingSal::Get().Reset();
-        uint8_t sentinel = 0;
-        uint8_t *pFrame = &sentinel;
-        uint32_t uLen = 77;
-        EXPECT_EQ(kind.pGenerate(&pFrame, &uLen, uFT), -1);
-        EXPECT_EQ(pFrame, &sentinel);
-        EXPECT_EQ(uLen, 77u);
-        EXPECT_EQ(RecordingSal::Get().allocCount, 0u);
-        EXPECT_TRUE(HasTrace(11, 0, error,
-                             "[AAC_Mute, " + std::to_string(kind.iErrorLine) + "] AMR" + kind.pName +
-                                 "_MuteFrame Error\n"));
-    }
-    uint32_t uLen = 0;
-    uint8_t *pFrame = nullptr;
-    EXPECT_EQ(kind.pGenerate(nullptr, &uLen, 0), -1);
-    EXPECT_EQ(kind.pGenerate(&pFrame, nullptr, 0), -1);
-}
+using Call = int32_t (*)(uint8_t **, uint32_t *, uint32_t);
+const Call kAac = [](uint8_t **pp, uint32_t *pu, uint32_t u) { return AAC_MuteFrame(pp, pu, 0, 8000, 1, 0, int(u)); };
+const Call kDra = [](uint8_t **pp, uint32_t *pu, uint32_t u) { return DRA_MuteFrame(pp, pu, u, 2); };
+const Call kNb = AMRNB_MuteFrame, kWb = AMRWB_MuteFrame;
 
-INSTANTIATE_TEST_SUITE_P(NarrowAndWide, AmrMute, testing::Values(&kNb, &kWb),
-                         [](const auto &info) { return std::string(info.param->pName); });
-
-TEST(AmrMuteExamples, FirstBytes)
-{
-    RecordingSal::Get().Reset();
-    const struct {
-        Generator pGenerate;
-        uint32_t uFT;
-        std::vector<uint8_t> start;
-    } cases[] = {{AMRNB_MuteFrame, 7, {0x3C, 0x48, 0xF9, 0x1F}},
-                 {AMRNB_MuteFrame, 0, {0x04, 0x63, 0x3C, 0xC7}},
-                 {AMRWB_MuteFrame, 8, {0x44, 0x11, 0x00, 0x00}}};
-    for (const auto &c : cases) {
-        uint8_t *pFrame = nullptr;
-        uint32_t uLen = 0;
-        ASSERT_EQ(c.pGenerate(&pFrame, &uLen, c.uFT), 0);
-        EXPECT_EQ(TakeFrame(pFrame, 4), c.start);
-    }
-}
-
-class DraMute : public testing::Test {
-protected:
-    void SetUp() override { RecordingSal::Get().Reset(); }
-    void TearDown() override { EXPECT_TRUE(RecordingSal::Get().liveBlocks.empty()); }
-};
-
-TEST_F(DraMute, StereoTemplatesPerRate)
+// Every template (AAC modes, AMR frame types, DRA rates) makes one allocation of its size, which
+// may fail with nothing stored; the AMR frames trace type and length.
+TEST(MuteFrames, EveryTemplateIsByteExact)
 {
     const struct {
-        uint32_t uRate;
-        std::vector<uint8_t> frame;
-    } cases[] = {{48000, {0x7F, 0xFF, 0x00, 0x5C, 0x13, 0xA0, 0x00, 0x1F}},
-                 {44100, {0x7F, 0xFF, 0x00, 0x5B, 0x93, 0xA0, 0x00, 0x1F}},
-                 {32000, {0x7F, 0xFF, 0x00, 0x5B, 0x13, 0xA0, 0x00, 0x1F}}};
-    for (const auto &c : cases) {
-        uint8_t *pFrame = nullptr;
-        uint32_t uLen = 0;
-        ASSERT_EQ(DRA_MuteFrame(&pFrame, &uLen, c.uRate, 2), 0);
-        EXPECT_EQ(TakeFrame(pFrame, uLen), c.frame);
-    }
-    EXPECT_EQ(RecordingSal::Get().allocSizes, (std::vector<uint32_t>{8, 8, 8}));
-    EXPECT_TRUE(RecordingSal::Get().traces.empty());
-}
-
-TEST_F(DraMute, Refusals)
-{
-    const std::string channels = "DRA_MuteFrame() channel num is not support %d\n";
-    const std::string noLen = "DRA_MuteFrame() uFrameLen is NULL\n";
-    uint8_t sentinel = 0;
-    uint8_t *pFrame = &sentinel;
-    uint32_t uLen = 77;
-    const struct {
-        uint8_t **ppFrame;
-        uint32_t *puLen;
-        uint32_t uRate;
-        uint32_t uChannels;
-        std::string format; // the one trace expected, empty for none
-        std::string text;
+        Call call;
+        uint32_t uArg, uSize, uDigest;
     } cases[] = {
-        {&pFrame, &uLen, 44100, 1, channels, "DRA_MuteFrame() channel num is not support 1\n"},
-        {&pFrame, &uLen, 48000, 6, channels, "DRA_MuteFrame() channel num is not support 6\n"},
-        {&pFrame, &uLen, 22050, 2, "", ""},
-        {&pFrame, &uLen, 96000, 2, "", ""},
-        {&pFrame, nullptr, 44100, 2, noLen, noLen},
-        {nullptr, &uLen, 44100, 2, "", ""},
+        {kAac, 0, 11, 0x81044C79}, {kAac, 1, 17, 0xC56A0CBA}, {kAac, 2, 22, 0xD69C5840}, {kAac, 3, 31, 0x7EC008AE},
+        {kAac, 4, 24, 0x6509E72F}, {kNb, 0, 13, 0x85608B38},  {kNb, 1, 14, 0x4AD2E25C},  {kNb, 2, 16, 0xC8C4BF28},
+        {kNb, 3, 18, 0x8F62BD0B},  {kNb, 4, 20, 0xD94FC280},  {kNb, 5, 21, 0x4BC46A81},  {kNb, 6, 27, 0x774D63E4},
+        {kNb, 7, 32, 0x034D93F7},  {kWb, 0, 18, 0xAA5BC1CE},  {kWb, 1, 24, 0x54F8408F},  {kWb, 2, 33, 0xB077DA04},
+        {kWb, 3, 37, 0xF5DA0D2B},  {kWb, 4, 41, 0xFA4E59CC},  {kWb, 5, 47, 0x4ADC6DC0},  {kWb, 6, 51, 0x7F5111E8},
+        {kWb, 7, 59, 0x22E08E7C},  {kWb, 8, 61, 0x31A10D1E},  {kDra, 48000, 8, 0x5F535CA1},
+        {kDra, 44100, 8, 0x151E53A8}, {kDra, 32000, 8, 0x448A9128}, // 7F FF 00 5B 93 A0 00 1F at 44100
     };
+    RecordingSal &sal = RecordingSal::Get();
     for (const auto &c : cases) {
-        SCOPED_TRACE(c.uRate);
-        RecordingSal::Get().Reset();
-        EXPECT_EQ(DRA_MuteFrame(c.ppFrame, c.puLen, c.uRate, c.uChannels), -1);
+        SCOPED_TRACE(testing::Message() << c.uArg << ", " << c.uSize << " bytes");
+        sal.Reset();
+        uint8_t sentinel = 0, *pFrame = &sentinel;
+        uint32_t uLen = 0;
+        sal.FailAllocation(1);
+        EXPECT_EQ(c.call(&pFrame, &uLen, c.uArg), -1);
         EXPECT_EQ(pFrame, &sentinel);
-        EXPECT_EQ(uLen, 77u);
+        sal.Reset();
+        ASSERT_EQ(c.call(&pFrame, &uLen, c.uArg), 0);
+        EXPECT_EQ(sal.allocSizes, std::vector<uint32_t>{c.uSize});
+        EXPECT_EQ(Fnv1a(TakeFrame(pFrame, uLen)), c.uDigest);
+        const std::string amr = c.call == kNb ? "[AAC_Mute, 189] AMRNB" : "[AAC_Mute, 264] AMRWB";
+        EXPECT_TRUE((c.call != kNb && c.call != kWb) ||
+                    HasNumberedTrace(1, amr + " FT = " + std::to_string(c.uArg) + ", FrameLen = " +
+                                            std::to_string(c.uSize) + "\n"));
+    }
+}
+
+// Refused calls allocate nothing, leave the outputs alone and leave one trace, or none.
+TEST(MuteFrames, Refusals)
+{
+    uint8_t sentinel = 0, *pFrame = &sentinel;
+    uint32_t uLen = 77;
+    const std::pair<std::function<int32_t()>, std::string> cases[] = {
+        {[&] { return AMRNB_MuteFrame(&pFrame, &uLen, 8); }, "[AAC_Mute, 252] AMRNB_MuteFrame Error\n"},
+        {[&] { return AMRWB_MuteFrame(&pFrame, &uLen, 9); }, "[AAC_Mute, 380] AMRWB_MuteFrame Error\n"},
+        {[&] { return AMRNB_MuteFrame(nullptr, &uLen, 0); }, ""},
+        {[&] { return AMRWB_MuteFrame(&pFrame, nullptr, 0); }, ""},
+        {[&] { return DRA_MuteFrame(&pFrame, &uLen, 44100, 1); }, "DRA_MuteFrame() channel num is not support 1\n"},
+        {[&] { return DRA_MuteFrame(&pFrame, &uLen, 22050, 2); }, ""},
+        {[&] { return DRA_MuteFrame(&pFrame, nullptr, 44100, 2); }, "DRA_MuteFrame() uFrameLen is NULL\n"},
+        {[&] { return DRA_MuteFrame(nullptr, &uLen, 44100, 2); }, ""},
+    };
+    for (const auto &[call, text] : cases) {
+        SCOPED_TRACE(text);
+        RecordingSal::Get().Reset();
+        EXPECT_EQ(call(), -1);
+        EXPECT_EQ(std::make_pair(pFrame, uLen), std::make_pair(&sentinel, 77u));
         EXPECT_EQ(RecordingSal::Get().allocCount, 0u);
-        if (c.format.empty())
-            EXPECT_TRUE(RecordingSal::Get().traces.empty());
-        else
-            EXPECT_TRUE(HasTrace(11, 0, c.format, c.text));
+        EXPECT_TRUE(text.empty() ? RecordingSal::Get().traces.empty() : HasNumberedTrace(11, text));
     }
 }
 

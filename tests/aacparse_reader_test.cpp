@@ -3,163 +3,58 @@
 #include <gtest/gtest.h>
 
 #include <cstdint>
-#include <random>
+#include <tuple>
 #include <vector>
 
 #include <vorcal/aacparse.h>
 
-#include "bit_writer.hpp"
-
 namespace {
 
-using vorcal::test::BitWriter;
+// Byte offset, bit position and processed bits of a reader over data.
+std::tuple<long, uint32_t, uint32_t> At(const VrBitReader_OnlyParsing &r, const std::vector<uint8_t> &data)
+{
+    return {long(r.pCurrent - data.data()), r.uBitPos, r.uProcessedBits};
+}
 
-struct Reader {
-    explicit Reader(std::vector<uint8_t> bytes) : data(std::move(bytes))
-    {
-        data.resize(data.size() + 8, 0); // the reader fetches up to four bytes ahead
-        VrInitBits_OnlyParsing(&bits, data.data());
+TEST(AacReader, ExactnessLimitsAndBookmark)
+{
+    std::vector<uint8_t> d = {0xC3, 0x5A, 0x96, 0xE1, 0x7F, 0x0F, 0, 0, 0, 0, 0, 0};
+    VrBitReader_OnlyParsing r{};
+    // At bit position p a wide read of 32 - p bits is the last exact one; one bit more yields 0
+    // (shift count out of range) but still advances.
+    for (uint32_t p = 0; p < 8; ++p) {
+        VrInitBits_OnlyParsing(&r, d.data());
+        VrFlushBits_OnlyParsing(&r, p);
+        const uint32_t exact = 32 - p, expected = uint32_t(0xC35A96E1ull & ((uint64_t{1} << exact) - 1));
+        EXPECT_EQ((std::tuple{VrShowBits_OnlyParsing(&r, exact), VrShowBits_OnlyParsing(&r, 25),
+                              VrGetBits_OnlyParsing(&r, exact + 1), VrGetBits_OnlyParsing(&r, 0)}), // in order
+                  std::make_tuple(expected, expected >> (exact - 25), 0u, 0u)) << p;
+        EXPECT_EQ(At(r, d), std::make_tuple(4L, 1u, 33u)) << p;
     }
-    uint32_t Offset() const { return static_cast<uint32_t>(bits.pCurrent - data.data()); }
-    std::vector<uint8_t> data;
-    VrBitReader_OnlyParsing bits{};
-};
-
-TEST(AacReader, TwelveBitsOfAnAdtsSyncWord)
-{
-    Reader r({0xFF, 0xF1, 0x50, 0x80});
-    EXPECT_EQ(VrGetBits_OnlyParsing(&r.bits, 12), 0xFFFu);
-    EXPECT_EQ(r.Offset(), 1u);
-    EXPECT_EQ(r.bits.uBitPos, 4u);
-    EXPECT_EQ(VrGetProcessedBits_OnlyParsing(&r.bits), 12u);
-    EXPECT_EQ(VrShowBits_OnlyParsing(&r.bits, 4), 0x1u);
-    EXPECT_EQ(VrGet1Bit_OnlyParsing(&r.bits), 0u);
-}
-
-TEST(AacReader, ZeroBitsReadNothing)
-{
-    Reader r({0xA5, 0x5A});
-    EXPECT_EQ(VrGetBits_OnlyParsing(&r.bits, 0), 0u);
-    EXPECT_EQ(r.Offset(), 0u);
-    EXPECT_EQ(r.bits.uBitPos, 0u);
-    EXPECT_EQ(r.bits.uProcessedBits, 0u);
-}
-
-// At bit position p, a wide read of 32 - p bits is the last exact one; one bit more yields 0
-// (shift count out of range) but still advances: 25 bits are exact at position 7, 26 are not.
-class AacReaderWideLimit : public ::testing::TestWithParam<uint32_t> {};
-
-TEST_P(AacReaderWideLimit, ExactUpToThirtyTwoMinusPosition)
-{
-    const uint32_t p = GetParam();
-    const std::vector<uint8_t> bytes = {0xC3, 0x5A, 0x96, 0xE1, 0x7F, 0x0F};
-    Reader r(bytes);
-    VrFlushBits_OnlyParsing(&r.bits, p);
-    const uint64_t word = 0xC35A96E1; // the four bytes at offset 0
-    const uint32_t exact = 32 - p;
-    const uint32_t expected = static_cast<uint32_t>(word & ((uint64_t{1} << exact) - 1));
-    EXPECT_EQ(VrShowBits_OnlyParsing(&r.bits, exact), expected);
-    EXPECT_EQ(VrShowBits_OnlyParsing(&r.bits, 25), expected >> (exact - 25));
-    EXPECT_EQ(VrShowBits_OnlyParsing(&r.bits, exact + 1), 0u);
-
-    EXPECT_EQ(VrGetBits_OnlyParsing(&r.bits, exact + 1), 0u);
-    EXPECT_EQ(r.bits.uProcessedBits, 33u);
-    EXPECT_EQ(r.Offset(), 4u);
-    EXPECT_EQ(r.bits.uBitPos, 1u);
-}
-
-INSTANTIATE_TEST_SUITE_P(BitPositions, AacReaderWideLimit, ::testing::Range(0u, 8u));
-
-TEST(AacReader, NarrowReadCombinesTwoBytes)
-{
-    Reader r({0b10110101, 0b11001010});
-    VrFlushBits_OnlyParsing(&r.bits, 5);
-    // Last three bits of the first byte (101), first five of the second (11001).
-    EXPECT_EQ(VrGetBitsFast_OnlyParsing(&r.bits, 8), 0b10111001u);
-    EXPECT_EQ(r.Offset(), 1u);
-    EXPECT_EQ(r.bits.uBitPos, 5u);
-}
-
-TEST(AacReader, NarrowReadSkipsNineteenBitsExactly)
-{
-    Reader r({0xFF, 0x00, 0xF3, 0xFF});
-    VrFlushBits_OnlyParsing(&r.bits, 3);
-    VrGetBitsFast_OnlyParsing(&r.bits, 19);
-    EXPECT_EQ(r.bits.uProcessedBits, 22u);
-    EXPECT_EQ(r.Offset(), 2u);
-    EXPECT_EQ(r.bits.uBitPos, 6u);
-    EXPECT_EQ(VrGetBits_OnlyParsing(&r.bits, 6), 0b111111u);
-}
-
-// Seeded random field widths written with the test writer and read back with every read kind
-// within its exact range.
-TEST(AacReader, RandomFieldsRoundTrip)
-{
-    for (uint32_t seed = 1; seed <= 20; ++seed) {
-        SCOPED_TRACE(seed);
-        std::mt19937 rng(seed);
-        BitWriter w;
-        std::vector<std::pair<uint32_t, uint32_t>> fields; // width, value
-        for (int i = 0; i < 200; ++i) {
-            const uint32_t n = 1 + rng() % 25;
-            const uint32_t v = rng() & ((n == 32) ? 0xFFFFFFFFu : ((1u << n) - 1));
-            fields.emplace_back(n, v);
-            w.Put(v, n);
-        }
-        Reader r(w.Bytes());
-        uint32_t total = 0;
-        for (size_t i = 0; i < fields.size(); ++i) {
-            const auto [n, v] = fields[i];
-            uint32_t got;
-            if (n == 1 && i % 2)
-                got = VrGet1Bit_OnlyParsing(&r.bits);
-            else if (n <= 8 && i % 3 == 0)
-                got = VrGetBitsFast_OnlyParsing(&r.bits, n);
-            else
-                got = VrGetBits_OnlyParsing(&r.bits, n);
-            ASSERT_EQ(got, v) << "field " << i << " of " << n << " bits";
-            total += n;
-            ASSERT_EQ(VrGetProcessedBits_OnlyParsing(&r.bits), total);
-            ASSERT_EQ(r.Offset(), total / 8);
-            ASSERT_EQ(r.bits.uBitPos, total % 8);
-        }
-    }
-}
-
-TEST(AacReader, ByteAlignCountsSkippedBits)
-{
-    Reader r({0xFF, 0xFF});
-    VrFlushBits_OnlyParsing(&r.bits, 3);
-    EXPECT_EQ(VrByteAlign_OnlyParsing(&r.bits), 5);
-    EXPECT_EQ(r.bits.uProcessedBits, 8u);
-    EXPECT_EQ(r.Offset(), 1u);
-    EXPECT_EQ(VrByteAlign_OnlyParsing(&r.bits), 0);
-    EXPECT_EQ(r.bits.uProcessedBits, 8u);
-}
-
-TEST(AacReader, BookmarkRestoresPositionAndCount)
-{
-    Reader r({0x12, 0x34, 0x56, 0x78, 0x9A, 0xBC, 0xDE});
-    VrFlushBits_OnlyParsing(&r.bits, 5);
-    VrBookMark_OnlyParsing(&r.bits, 1);
-    EXPECT_EQ(r.bits.uBookmarkSet, 1u);
-    VrGetBits_OnlyParsing(&r.bits, 32);
-    VrBookMark_OnlyParsing(&r.bits, 0);
-    EXPECT_EQ(r.Offset(), 0u);
-    EXPECT_EQ(r.bits.uBitPos, 5u);
-    EXPECT_EQ(r.bits.uProcessedBits, 5u);
-    EXPECT_EQ(r.bits.uBookmarkSet, 0u);
-
-    // A second save overwrites the slot; initialisation keeps it, so a restore after a fresh
-    // start still returns to the last save.
-    VrFlushBits_OnlyParsing(&r.bits, 10);
-    VrBookMark_OnlyParsing(&r.bits, 1);
-    VrInitBits_OnlyParsing(&r.bits, r.data.data() + 3);
-    EXPECT_EQ(r.bits.uBookmarkSet, 0u);
-    VrBookMark_OnlyParsing(&r.bits, 0);
-    EXPECT_EQ(r.Offset(), 1u);
-    EXPECT_EQ(r.bits.uBitPos, 7u);
-    EXPECT_EQ(r.bits.uProcessedBits, 15u);
+    // A narrow read spans two bytes; beyond 8 bits it still advances exactly, as a skip.
+    VrInitBits_OnlyParsing(&r, d.data());
+    VrFlushBits_OnlyParsing(&r, 5);
+    EXPECT_EQ(VrGetBitsFast_OnlyParsing(&r, 8), 0b01101011u); // 011 and 01011
+    VrGetBitsFast_OnlyParsing(&r, 19);
+    EXPECT_EQ((std::tuple{VrGetBits_OnlyParsing(&r, 6), VrByteAlign_OnlyParsing(&r), VrByteAlign_OnlyParsing(&r),
+                          VrGetBitsFast_OnlyParsing(&r, 4), VrGet1Bit_OnlyParsing(&r)}),
+              std::make_tuple(0b011111u, 2, 0, 0u, 1u)); // the top of 0x7F, two bits to the boundary, 0x0F
+    EXPECT_EQ(At(r, d), std::make_tuple(5L, 5u, 45u));
+    // The bookmark restores position and count. A second save overwrites the slot;
+    // initialisation keeps it, so a restore after a fresh start returns to the last save.
+    VrInitBits_OnlyParsing(&r, d.data());
+    VrFlushBits_OnlyParsing(&r, 5);
+    VrBookMark_OnlyParsing(&r, 1);
+    EXPECT_EQ(r.uBookmarkSet, 1u);
+    VrGetBits_OnlyParsing(&r, 32);
+    VrBookMark_OnlyParsing(&r, 0);
+    EXPECT_EQ(std::tuple_cat(At(r, d), std::make_tuple(r.uBookmarkSet)), std::make_tuple(0L, 5u, 5u, 0u));
+    VrFlushBits_OnlyParsing(&r, 10);
+    VrBookMark_OnlyParsing(&r, 1);
+    VrInitBits_OnlyParsing(&r, d.data() + 3);
+    EXPECT_EQ(r.uBookmarkSet, 0u);
+    VrBookMark_OnlyParsing(&r, 0);
+    EXPECT_EQ(At(r, d), std::make_tuple(1L, 7u, 15u));
 }
 
 } // namespace

@@ -1,8 +1,8 @@
 #include <gtest/gtest.h>
 
-#include <cstring>
-#include <memory>
-#include <tuple>
+#include <algorithm>
+#include <array>
+#include <bit>
 #include <vector>
 
 #include <vorcal/video_tools.h>
@@ -12,292 +12,131 @@
 using vorcal::test::BitWriter;
 using Bytes = std::vector<uint8_t>;
 
-// Beside the record's own (global) namespace, so that gtest finds them.
-static bool operator==(const CALMPEG4DSIInfo &a, const CALMPEG4DSIInfo &b)
-{
-    return std::memcmp(&a, &b, sizeof a) == 0;
-}
-
-static std::ostream &operator<<(std::ostream &os, const CALMPEG4DSIInfo &i)
-{
-    return os << "{profile " << i.uProfile << ", level " << i.uLevel << ", format " << i.uSourceFormat << ", "
-              << i.uWidth << "x" << i.uHeight << "}";
-}
-
 namespace {
 
-constexpr uint32_t kUntouched = 77;
+constexpr uint32_t U = 77;              // a field the walk leaves untouched
+using Result = std::array<uint32_t, 6>; // result, profile, level, source format, width, height
+using Case = std::pair<Bytes, Result>;  // configuration data and the walk's result for it
 
-CALMPEG4DSIInfo Preset()
+// The walk on an exactly-sized heap copy of the first n bytes, so that ASan sees any read past it.
+Result Walk(const Bytes &dsi, size_t n = SIZE_MAX)
 {
-    return {kUntouched, kUntouched, kUntouched, kUntouched, kUntouched};
+    const Bytes copy(dsi.begin(), dsi.begin() + long(std::min(n, dsi.size())));
+    CALMPEG4DSIInfo i{U, U, U, U, U};
+    // A braced list is evaluated in order: the walk runs before the fields are read.
+    return {vorCALTools_MPEG4V_GetDSIInfo(copy.data(), uint32_t(copy.size()), &i), i.uProfile, i.uLevel,
+            i.uSourceFormat, i.uWidth, i.uHeight};
 }
 
-// Runs the walk on an exactly-sized heap copy, so that ASan sees any read past the DSI.
-std::pair<uint32_t, CALMPEG4DSIInfo> Walk(const Bytes &dsi, size_t n = SIZE_MAX)
+Bytes operator+(Bytes a, const Bytes &b)
 {
-    n = std::min(n, dsi.size());
-    std::unique_ptr<uint8_t[]> copy(new uint8_t[n]);
-    if (n != 0)
-        std::memcpy(copy.get(), dsi.data(), n);
-    CALMPEG4DSIInfo info = Preset();
-    const uint32_t result = vorCALTools_MPEG4V_GetDSIInfo(copy.get(), uint32_t(n), &info);
-    return {result, info};
+    a.insert(a.end(), b.begin(), b.end());
+    return a;
 }
 
-Bytes Concat(std::initializer_list<Bytes> parts)
-{
-    Bytes out;
-    for (const Bytes &part : parts)
-        out.insert(out.end(), part.begin(), part.end());
-    return out;
-}
+const Bytes kVos = {0, 0, 1, 0xB0, 0x03}, kVisualObject = {0, 0, 1, 0xB5, 0x09}, kVo = {0, 0, 1, 0x00},
+            kVolCode = {0, 0, 1, 0x20}, kTail = {0x5A, 0x5A, 0x5A, 0x5A, 0x5A, 0x5A, 0x5A, 0x5A};
 
-const Bytes kVosSimpleL3 = {0, 0, 1, 0xB0, 0x03};
-const Bytes kVisualObject = {0, 0, 1, 0xB5, 0x09};
-const Bytes kVideoObject = {0, 0, 1, 0x00};
-const Bytes kVolStart = {0, 0, 1, 0x20};
-const Bytes kTail = {0x5A, 0x5A, 0x5A, 0x5A, 0x5A, 0x5A, 0x5A, 0x5A};
-
+// The optional fields of a layer: is_object_layer_identifier, aspect_ratio_info, control (0 no
+// vol_control_parameters, 1 without VBV parameters, 2 with them), vop_time_increment_resolution,
+// fixed_vop_rate, and the picture size.
 struct Vol {
-    bool objectLayerId = false;
-    uint32_t aspectRatioInfo = 1;
-    int controlParameters = 0; // 0 absent, 1 without VBV parameters, 2 with them
-    uint32_t resolution = 30000;
-    bool fixedRate = false;
-    uint32_t width = 352;
-    uint32_t height = 288;
+    uint32_t layerId = 0, aspect = 1, control = 0, resolution = 30000, fixedRate = 0, width = 352, height = 288;
 };
 
-// video_object_layer() after its start code, ISO/IEC 14496-2 6.2.3, rectangular shape.
+// video_object_layer() from after its start code to the end of its byte (ISO/IEC 14496-2 6.2.3).
 Bytes VolBody(const Vol &v)
 {
     BitWriter w;
-    w.Put(0, 1).Put(0x01, 8);            // random_accessible_vol, video_object_type_indication
-    w.Put(v.objectLayerId, 1);
-    if (v.objectLayerId)
-        w.Put(2, 4).Put(1, 3);           // video_object_layer_verid, _priority
-    w.Put(v.aspectRatioInfo, 4);
-    if (v.aspectRatioInfo == 15)
-        w.Put(12, 8).Put(11, 8);         // par_width, par_height
-    w.Put(v.controlParameters != 0, 1);
-    if (v.controlParameters != 0) {
-        w.Put(1, 2).Put(1, 1).Put(v.controlParameters == 2, 1); // chroma_format, low_delay, vbv_parameters
-        if (v.controlParameters == 2) {
-            w.Put(0x7FFF, 15).Put(1, 1).Put(0x7FFF, 15).Put(1, 1); // bit rate halves
-            w.Put(0x7FFF, 15).Put(1, 1).Put(7, 3);                 // buffer size halves
-            w.Put(0x7FF, 11).Put(1, 1).Put(0x7FFF, 15).Put(1, 1);  // occupancy halves
-        }
-    }
+    w.Put(0, 1).Put(0x01, 8).Put(v.layerId, 1); // random_accessible_vol, type, is_object_layer_identifier
+    if (v.layerId)
+        w.Put(2, 4).Put(1, 3);
+    w.Put(v.aspect, 4);
+    if (v.aspect == 15)
+        w.Put(12, 8).Put(11, 8); // par_width, par_height
+    w.Put(v.control != 0, 1);
+    if (v.control != 0)
+        w.Put(1, 2).Put(1, 1).Put(v.control == 2, 1); // chroma_format, low_delay, vbv_parameters
+    if (v.control == 2) // VBV bit rate, buffer size and occupancy with their markers: 79 bits, all ones
+        w.Put(0x7FFFFFFF, 31).Put(0x7FFFFFFF, 31).Put(0x1FFFF, 17);
     w.Put(0, 2).Put(1, 1).Put(v.resolution, 16).Put(1, 1).Put(v.fixedRate, 1);
-    if (v.fixedRate) {
-        unsigned bits = 1;
-        while ((1u << bits) < v.resolution)
-            ++bits;
-        w.Put(v.resolution - 1, bits);   // fixed_vop_time_increment, all ones where possible
-    }
-    w.Put(1, 1).Put(v.width, 13).Put(1, 1).Put(v.height, 13).Put(1, 1);
-    w.Put(0, 1).Put(1, 1).Put(0, 1);     // interlaced, obmc_disable, sprite_enable
-    return w.Align().Bytes();
+    if (v.fixedRate) // fixed_vop_time_increment, all ones
+        w.Put(0xFFFF, unsigned(std::bit_width((v.resolution - 1) | 1u)));
+    return w.Put(1, 1).Put(v.width, 13).Put(1, 1).Put(v.height, 13).Put(1, 1).Put(0b010, 3).Align().Bytes();
 }
 
-Bytes SimpleDsi(const Vol &v)
-{
-    return Concat({kVosSimpleL3, kVisualObject, kVideoObject, kVolStart, VolBody(v), kTail});
-}
-
-// profile_and_level_indication -> profile, level.
-class ProfileLevelTest : public ::testing::TestWithParam<std::tuple<uint8_t, uint32_t, uint32_t>> {};
-
-TEST_P(ProfileLevelTest, Mapping)
-{
-    const auto [indication, profile, level] = GetParam();
-    const auto [result, info] = Walk(Concat({{0, 0, 1, 0xB0, indication}, kVisualObject, kTail}));
-    EXPECT_EQ(result, 0u);
-    EXPECT_EQ(info.uProfile, profile);
-    EXPECT_EQ(info.uLevel, level);
-    EXPECT_EQ(info.uWidth, kUntouched);
-}
-
-INSTANTIATE_TEST_SUITE_P(Indications, ProfileLevelTest,
-                         ::testing::Values(std::make_tuple(0x01, 0u, 1u), std::make_tuple(0x02, 0u, 2u),
-                                           std::make_tuple(0x03, 0u, 3u), std::make_tuple(0x04, 0u, 4u),
-                                           std::make_tuple(0x05, 0u, 5u), std::make_tuple(0x08, 0u, 0u),
-                                           std::make_tuple(0x09, 0u, 0u), std::make_tuple(0x11, 1u, 1u),
-                                           std::make_tuple(0x12, 1u, 2u), std::make_tuple(0x00, 255u, 255u),
-                                           std::make_tuple(0x06, 255u, 255u), std::make_tuple(0x10, 255u, 255u),
-                                           std::make_tuple(0xF0, 255u, 255u), std::make_tuple(0xF5, 255u, 255u)));
-
-// Every combination of the optional VOL fields in front of the picture size.
-class VolTest : public ::testing::TestWithParam<std::tuple<bool, uint32_t, int, std::pair<uint32_t, bool>,
-                                                           std::pair<uint32_t, uint32_t>>> {};
-
-TEST_P(VolTest, PictureSize)
-{
-    const auto [oli, ari, control, rate, size] = GetParam();
-    Vol v;
-    v.objectLayerId = oli;
-    v.aspectRatioInfo = ari;
-    v.controlParameters = control;
-    v.resolution = rate.first;
-    v.fixedRate = rate.second;
-    v.width = size.first;
-    v.height = size.second;
-    const auto [result, info] = Walk(SimpleDsi(v));
-    EXPECT_EQ(result, 0u);
-    EXPECT_EQ(info, (CALMPEG4DSIInfo{0, 3, kUntouched, size.first, size.second}));
-}
-
-INSTANTIATE_TEST_SUITE_P(
-    Fields, VolTest,
-    ::testing::Combine(::testing::Bool(), ::testing::Values(1u, 15u), ::testing::Values(0, 1, 2),
-                       ::testing::Values(std::make_pair(1u, true), std::make_pair(2u, true),
-                                         std::make_pair(25u, false), std::make_pair(30000u, true),
-                                         std::make_pair(65535u, true)),
-                       ::testing::Values(std::make_pair(352u, 288u), std::make_pair(176u, 144u),
-                                         std::make_pair(1920u, 1080u), std::make_pair(8191u, 2u))));
-
-TEST(GetDSIInfo, EmptyOrNull)
-{
-    CALMPEG4DSIInfo info = Preset();
-    const uint8_t byte = 0;
-    EXPECT_EQ(vorCALTools_MPEG4V_GetDSIInfo(&byte, 0, &info), 1u);
-    EXPECT_EQ(vorCALTools_MPEG4V_GetDSIInfo(nullptr, 0, &info), 1u);
-    EXPECT_EQ(vorCALTools_MPEG4V_GetDSIInfo(nullptr, 16, &info), 0u);
-    EXPECT_EQ(info, Preset());
-}
-
-// Which headers the walk acts on, and in what order.
-TEST(GetDSIInfo, HeaderWalk)
-{
-    const Bytes vol = VolBody(Vol{});
-    struct Case {
-        const char *name;
-        Bytes dsi;
-        CALMPEG4DSIInfo expected;
-    } cases[] = {
-        {"TypicalSimpleProfile", SimpleDsi(Vol{}), {0, 3, kUntouched, 352, 288}},
-        {"LayerWithoutVideoObject", Concat({kVosSimpleL3, kVolStart, vol, kTail}), {0, 3, kUntouched, kUntouched, kUntouched}},
-        {"UserDataBetweenObjectAndLayer",
-         Concat({kVideoObject, {0, 0, 1, 0xB2, 'x'}, kVolStart, vol, kTail}),
-         Preset()},
-        {"LayerAfterGarbage", Concat({{0xFF, 0x12}, kVideoObject, kVolStart, vol, kTail}),
-         {kUntouched, kUntouched, kUntouched, 352, 288}},
-        {"SequenceEndStopsTheWalk",
-         Concat({kVosSimpleL3, {0, 0, 1, 0xB1}, {0, 0, 1, 0xB0, 0xF0}, kVideoObject, kVolStart, vol, kTail}),
-         {0, 3, kUntouched, kUntouched, kUntouched}},
-        {"LaterHeadersOverwrite",
-         Concat({kVosSimpleL3, kVideoObject, kVolStart, vol, {0, 0, 1, 0xB0, 0x12}, kVideoObject, kVolStart,
-                 VolBody(Vol{false, 1, 0, 30000, false, 176, 144}), kTail}),
-         {1, 2, kUntouched, 176, 144}},
-    };
-    for (const Case &c : cases) {
-        const auto [result, info] = Walk(c.dsi);
-        EXPECT_EQ(result, 0u) << c.name;
-        EXPECT_EQ(info, c.expected) << c.name;
-    }
-}
-
-// An H.263 short-header picture (ITU-T H.263 5.1), optionally with PLUSPTYPE.
-struct Short {
-    uint32_t sourceFormat;
-    uint32_t ufep = 1;
-    uint32_t extendedFormat = 6;
-    uint32_t widthIndication = 79;
-    uint32_t heightIndication = 60;
-};
-
-Bytes ShortHeader(const Short &s)
+// An H.263 picture header (PSC, TR, PTYPE and, for source format 7, PLUSPTYPE and CPFMT) and the
+// walk's result for it.
+Case Picture(uint32_t width, uint32_t height, uint32_t format, uint32_t ufep = 1, uint32_t extFormat = 6,
+             uint32_t widthInd = 79, uint32_t heightInd = 60)
 {
     BitWriter w;
-    w.Put(0x20, 22).Put(0x55, 8);         // short_video_start_marker / PSC, temporal_reference
-    w.Put(0b10, 2).Put(0, 3).Put(s.sourceFormat, 3);
-    if (s.sourceFormat != 7) {
-        w.Put(0, 1).Put(0, 4).Put(8, 5).Put(0, 1).Put(0, 1); // coding type, options, PQUANT, CPM, PEI
-    } else {
-        w.Put(s.ufep, 3);
-        if (s.ufep == 1)
-            w.Put(s.extendedFormat, 3).Put(0, 1).Put(0b00000000001000, 14); // OPPTYPE
-        w.Put(0, 3).Put(0, 3).Put(0b001, 3).Put(0, 1);                    // MPPTYPE, CPM
-        if (s.ufep == 1 && s.extendedFormat == 6)
-            w.Put(1, 4).Put(s.widthIndication, 9).Put(1, 1).Put(s.heightIndication, 9); // CPFMT
-        w.Put(8, 5);                                                      // PQUANT
-    }
-    return Concat({w.Align().Bytes(), kTail});
+    w.Put(0x20, 22).Put(0x55, 8).Put(0b10, 2).Put(0, 3).Put(format, 3);
+    if (format == 7 && ufep == 1)
+        w.Put(ufep, 3).Put(extFormat, 3).Put(0, 1).Put(0b00000000001000, 14); // UFEP, OPPTYPE
+    else if (format == 7)
+        w.Put(ufep, 3);
+    w.Put(0, 6).Put(0b001, 3).Put(0, 1); // MPPTYPE and CPM, or PTYPE's rest and PQUANT
+    if (format == 7 && ufep == 1 && extFormat == 6)
+        w.Put(1, 4).Put(widthInd, 9).Put(1, 1).Put(heightInd, 9); // CPFMT
+    return {w.Put(8, 5).Align().Bytes(), {0, U, U, format, width, height}};
 }
 
-TEST(GetDSIInfo, ShortHeader)
+// Each configuration in full, and every prefix of it: the walk stays inside the data and only
+// empty data answers 1.
+TEST(GetDSIInfo, Walk)
 {
-    struct Case {
-        Short header;
-        uint32_t width, height;
-    } cases[] = {
-        {{0}, 0, 0},
-        {{1}, 128, 96},
-        {{2}, 176, 144},
-        {{3}, 352, 288},
-        {{4}, 704, 576},
-        {{5}, 1408, 1152},
-        {{6}, 0, 0}, // reserved source format: no size
-        {{7, 1, 6, 79, 60}, 320, 240},
-        {{7, 1, 6, 0, 1}, 4, 4},
-        {{7, 1, 6, 511, 511}, 2048, 2044},
-        {{7, 1, 2}, 176, 144},
-        {{7, 1, 5}, 1408, 1152},
-        {{7, 1, 7}, 0, 0},
-        {{7, 0}, 0, 0},
-        {{7, 3}, 0, 0},
+    auto vos = [](uint8_t indication, uint32_t profile, uint32_t level) {
+        return Case{Bytes{0, 0, 1, 0xB0, indication} + kVisualObject + kTail, {0, profile, level, U, U, U}};
     };
-    for (const Case &c : cases) {
-        const auto [result, info] = Walk(Concat({{0x12, 0x34}, ShortHeader(c.header)}));
-        EXPECT_EQ(result, 0u);
-        EXPECT_EQ(info, (CALMPEG4DSIInfo{kUntouched, kUntouched, c.header.sourceFormat, c.width, c.height}))
-            << c.header.sourceFormat << "/" << c.header.ufep << "/" << c.header.extendedFormat;
-    }
-    // The literal picture header 00 00 80 02 08: QCIF.
-    EXPECT_EQ(Walk(Concat({{0, 0, 0x80, 0x02, 0x08}, kTail})).second,
-              (CALMPEG4DSIInfo{kUntouched, kUntouched, 2, 176, 144}));
-    // The end marker stops the walk before a second picture.
-    const auto [result, info] = Walk(Concat({ShortHeader({2}), {0, 0, 0xFC, 0x00}, ShortHeader({3})}));
-    EXPECT_EQ(result, 0u);
-    EXPECT_EQ(info.uWidth, 176u);
-}
-
-// Every prefix of real-looking configurations, each in an exactly-sized buffer: the walk stays
-// inside, and the full data gives the full answer.
-TEST(GetDSIInfo, EveryPrefix)
-{
-    const Bytes inputs[] = {
-        SimpleDsi(Vol{true, 15, 2, 30000, true, 720, 576}),
-        Concat({kVosSimpleL3, kVideoObject, kVolStart}),
-        ShortHeader({7, 1, 6, 79, 60}),
-        {0, 0, 1, 0, 0, 0, 1, 0x20, 0x00, 0x00, 0x03, 0x00, 0x00, 0x03},
+    auto layer = [](const Vol &v) {
+        return Case{kVos + kVisualObject + kVo + kVolCode + VolBody(v) + kTail, {0, 0, 3, U, v.width, v.height}};
     };
-    for (const Bytes &dsi : inputs) {
-        for (size_t n = 0; n <= dsi.size(); ++n) {
-            const auto [result, info] = Walk(dsi, n);
-            EXPECT_EQ(result, n == 0 ? 1u : 0u) << n;
-        }
+    const Bytes vol = kVolCode + VolBody({}), qcif = VolBody({.width = 176, .height = 144});
+    const Case cases[] = {
+        // profile_and_level_indication
+        vos(0x01, 0, 1), vos(0x02, 0, 2), vos(0x03, 0, 3), vos(0x04, 0, 4), vos(0x05, 0, 5), vos(0x08, 0, 0),
+        vos(0x09, 0, 0), vos(0x11, 1, 1), vos(0x12, 1, 2), vos(0x00, 255, 255), vos(0xF5, 255, 255),
+        // The optional layer fields in front of the picture size, one at a time and all together.
+        layer({}), layer({.layerId = true}), layer({.aspect = 15}), layer({.control = 1}), layer({.control = 2}),
+        layer({.resolution = 1, .fixedRate = true}), layer({.resolution = 2, .fixedRate = true}),
+        layer({.resolution = 65535, .fixedRate = true, .width = 1920, .height = 1080}),
+        layer({true, 15, 2, 30000, true, 8191, 2}),
+        // Data that ends right after the size fields still gives them, although the reader
+        // reported the end a few bytes before.
+        {kVos + kVo + kVolCode + VolBody({true, 15, 2, 25, true, 720, 576}), {0, 0, 3, U, 720, 576}},
+        // Which headers the walk acts on, and where it stops.
+        {kVos + vol + kTail, {0, 0, 3, U, U, U}},                                        // layer without object
+        {kVo + Bytes{0, 0, 1, 0xB2, 'x'} + vol + kTail, {0, U, U, U, U, U}},             // user data between
+        {Bytes{0xFF, 0x12} + kVo + vol + kTail, {0, U, U, U, 352, 288}},                 // garbage first
+        {kVos + Bytes{0, 0, 1, 0xB1, 0, 0, 1, 0xB0, 0xF0} + kVo + vol, {0, 0, 3, U, U, U}}, // sequence end
+        {kVos + kVo + vol + Bytes{0, 0, 1, 0xB0, 0x12} + kVo + kVolCode + qcif + kTail, {0, 1, 2, U, 176, 144}},
+        {{0, 0, 1, 0, 0, 0, 1, 0x20, 0x00, 0x00, 0x03, 0x00, 0x00, 0x03}, {0, U, U, U, 0, 0}}, // all-zero layer
+        {{}, {1, U, U, U, U, U}},
+        // H.263 picture headers: source formats, PLUSPTYPE with custom and table sizes, the end marker.
+        {Bytes{0x12, 0x34, 0, 0, 0x80, 0x02, 0x08} + kTail, {0, U, U, 2, 176, 144}},
+        Picture(0, 0, 0), Picture(128, 96, 1), Picture(176, 144, 2), Picture(352, 288, 3), Picture(704, 576, 4),
+        Picture(1408, 1152, 5), Picture(0, 0, 6), Picture(320, 240, 7), Picture(2048, 2044, 7, 1, 6, 511, 511),
+        Picture(176, 144, 7, 1, 2), Picture(0, 0, 7, 1, 7), Picture(0, 0, 7, 0),
+        {Picture(176, 144, 2).first + Bytes{0, 0, 0xFE, 0x00} + Picture(352, 288, 3).first, {0, U, U, 2, 176, 144}},
+    };
+    for (const auto &[data, expected] : cases) {
+        for (size_t n = 0; n < data.size(); ++n)
+            EXPECT_EQ(Walk(data, n)[0], n == 0 ? 1u : 0u) << ::testing::PrintToString(data) << n;
+        EXPECT_EQ(Walk(data), expected) << ::testing::PrintToString(data);
     }
-    EXPECT_EQ(Walk(inputs[0]).second, (CALMPEG4DSIInfo{0, 3, kUntouched, 720, 576}));
-    EXPECT_EQ(Walk(inputs[2]).second, (CALMPEG4DSIInfo{kUntouched, kUntouched, 7, 320, 240}));
+    CALMPEG4DSIInfo info{U, U, U, U, U};
+    EXPECT_EQ((std::pair{vorCALTools_MPEG4V_GetDSIInfo(nullptr, 16, &info), info.uWidth}), (std::pair{0u, U}));
 }
 
 TEST(VC1GetExtraDataInfo, Profile)
 {
-    const std::pair<uint8_t, uint32_t> cases[] = {{0x4E, 1}, {0xC0, 3}, {0x00, 0}, {0xBF, 2}};
-    for (auto [byte0, profile] : cases) {
-        const uint8_t extra[] = {byte0};
-        uint32_t out = kUntouched;
-        EXPECT_EQ(vorCALTools_VC1_GetExtraDataInfo(extra, 1, &out), 0u);
-        EXPECT_EQ(out, profile);
-    }
-    uint32_t out = kUntouched;
-    const uint8_t extra[] = {0xC0};
-    EXPECT_EQ(vorCALTools_VC1_GetExtraDataInfo(nullptr, 4, &out), 1u);
-    EXPECT_EQ(vorCALTools_VC1_GetExtraDataInfo(extra, 0, &out), 1u);
-    EXPECT_EQ(vorCALTools_VC1_GetExtraDataInfo(extra, 1, nullptr), 1u);
-    EXPECT_EQ(out, kUntouched);
+    const uint8_t extra[] = {0x4E, 0xC0};
+    uint32_t a = U, b = U, c = U;
+    auto get = vorCALTools_VC1_GetExtraDataInfo;
+    EXPECT_EQ((std::array{get(extra, 1, &a), get(extra + 1, 1, &b), a, b, get(nullptr, 4, &c), get(extra, 0, &c),
+                          get(extra, 1, nullptr), c}),
+              (std::array{0u, 0u, 1u, 3u, 1u, 1u, 1u, U})); // 1 for null or empty data and a null out pointer
 }
 
 } // namespace

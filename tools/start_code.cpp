@@ -5,8 +5,8 @@
 #include "tools/start_code.hpp"
 
 #include <bit>
-#include <cstring>
 #include <cstdint>
+#include <cstring>
 
 #if defined(__AVX2__) || defined(__SSE2__)
 #include <immintrin.h>
@@ -158,23 +158,45 @@ inline bool StrideMayHoldPrefix(const uint8_t *p) noexcept
     return kStride;
 }
 
-// The search from i while whole strides, then whole blocks, fit below uStop. Returns the
-// prefix found or uEnd; i is left at the first position not yet examined.
-inline size_t ScanWhole(const uint8_t *pData, size_t &i, size_t uStop, size_t uEnd) noexcept
+// Prefetch distance of the stride loop: the hardware prefetcher alone leaves the loop waiting
+// on the outer caches; 2 KB ahead keeps enough lines in flight.
+constexpr size_t kPrefetch = 2048;
+
+// First prefix beginning in the aligned stride at p, or kStride; reads p[0..kStride + 2).
+inline size_t ScanStride(const uint8_t *p) noexcept
+{
+    return StrideMayHoldPrefix(p) ? FindInStride(p) : kStride;
+}
+
+// The search from i while whole strides, then whole blocks, fit below uStop; lines up to
+// uDataEnd (the end of the caller's data) are prefetched. Returns the prefix found or uEnd; i
+// is left at the first position not yet examined.
+inline size_t ScanWhole(const uint8_t *pData, size_t &i, size_t uStop, size_t uEnd, size_t uDataEnd) noexcept
 {
     if constexpr (kStride != 0) {
         if (i + kBlock + kStride <= uStop) {
-            // One unaligned block, then strides from the next block boundary on.
-            const size_t k = ScanBlock(pData + i);
-            if (k != kBlock)
-                return i + k;
-            i += kBlock - reinterpret_cast<uintptr_t>(pData + i) % kBlock;
+            // The strides begin at a block boundary; an unaligned first block covers the way there.
+            const size_t uMisaligned = reinterpret_cast<uintptr_t>(pData + i) % kBlock;
+            if (uMisaligned != 0) {
+                const size_t k = ScanBlock(pData + i);
+                if (k != kBlock)
+                    return i + k;
+                i += kBlock - uMisaligned;
+            }
+            // Strides with a prefetch while the line fetched stays inside the data, then without.
+            const size_t uAheadStop = uDataEnd >= kPrefetch + kStride ? uDataEnd - kPrefetch : 0;
+            const size_t uPrefetchStop = uAheadStop < uStop ? uAheadStop : uStop;
+            for (; i + kStride <= uPrefetchStop; i += kStride) {
+                __builtin_prefetch(pData + i + kPrefetch);
+                __builtin_prefetch(pData + i + kPrefetch + 64);
+                const size_t s = ScanStride(pData + i);
+                if (s != kStride)
+                    return i + s;
+            }
             for (; i + kStride <= uStop; i += kStride) {
-                if (StrideMayHoldPrefix(pData + i)) {
-                    const size_t s = FindInStride(pData + i);
-                    if (s != kStride)
-                        return i + s;
-                }
+                const size_t s = ScanStride(pData + i);
+                if (s != kStride)
+                    return i + s;
             }
         }
     }
@@ -186,18 +208,14 @@ inline size_t ScanWhole(const uint8_t *pData, size_t &i, size_t uStop, size_t uE
     return uEnd;
 }
 
-// Bytes searched before each memcpy of the copying variant: small enough to stay in L1.
-constexpr size_t kCopyChunk = 4096;
-
-} // namespace
-
-size_t FindStartCodePrefix(const uint8_t *pData, size_t uFrom, size_t uEnd) noexcept
+// FindStartCodePrefix, prefetching up to uDataEnd >= uEnd.
+size_t Find(const uint8_t *pData, size_t uFrom, size_t uEnd, size_t uDataEnd) noexcept
 {
     if (uEnd < 3 || uFrom >= uEnd - 2)
         return uEnd;
     const size_t uLast = uEnd - 2; // a prefix begins below uLast
     size_t i = uFrom;
-    const size_t r = ScanWhole(pData, i, uLast, uEnd);
+    const size_t r = ScanWhole(pData, i, uLast, uEnd, uDataEnd);
     if (r != uEnd)
         return r;
     for (; i < uLast; ++i) {
@@ -207,17 +225,30 @@ size_t FindStartCodePrefix(const uint8_t *pData, size_t uFrom, size_t uEnd) noex
     return uEnd;
 }
 
+// Bytes searched before each memcpy of the copying variant: small enough to stay in L1.
+constexpr size_t kCopyChunk = 4096;
+
+} // namespace
+
+size_t FindStartCodePrefix(const uint8_t *pData, size_t uFrom, size_t uEnd) noexcept
+{
+    return Find(pData, uFrom, uEnd, uEnd);
+}
+
 size_t FindStartCodePrefixCopy(const uint8_t *pData, size_t uFrom, size_t uEnd, uint8_t *pDst,
                                size_t uDstRoom) noexcept
 {
     for (size_t i = uFrom; i < uEnd;) {
         const size_t uDone = i - uFrom;
         if (uDone >= uDstRoom)
-            return FindStartCodePrefix(pData, i, uEnd);
-        // Prefixes beginning below uChunkEnd lie wholly below uScanEnd.
-        const size_t uChunkEnd = uEnd - i > kCopyChunk ? i + kCopyChunk : uEnd;
+            return Find(pData, i, uEnd, uEnd);
+        // Chunks end on stride boundaries, so that the searches after the first are whole
+        // strides; prefixes beginning below uChunkEnd lie wholly below uScanEnd.
+        const size_t uChunkEnd = uEnd - i > kCopyChunk
+            ? i + kCopyChunk - reinterpret_cast<uintptr_t>(pData + i + kCopyChunk) % (kStride != 0 ? kStride : 1)
+            : uEnd;
         const size_t uScanEnd = uEnd - uChunkEnd > 2 ? uChunkEnd + 2 : uEnd;
-        const size_t r = FindStartCodePrefix(pData, i, uScanEnd);
+        const size_t r = Find(pData, i, uScanEnd, uEnd);
         const size_t uStop = r < uScanEnd ? r : uChunkEnd;
         const size_t uRoom = uDstRoom - uDone;
         memcpy(pDst + uDone, pData + i, uStop - i < uRoom ? uStop - i : uRoom);

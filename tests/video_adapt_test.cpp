@@ -6,7 +6,6 @@
 #include <algorithm>
 #include <cstdio>
 #include <fstream>
-#include <regex>
 #include <string>
 #include <tuple>
 
@@ -110,8 +109,8 @@ protected:
         Texts texts;
         for (const TraceRecord &t : sal.traces)
             if (t.text.starts_with("[CAL_Wrapper "))
-                texts.push_back(std::to_string(t.iCategory) + "/" + std::to_string(t.iLevel) + " " +
-                                std::regex_replace(t.text, std::regex("^\\[CAL_Wrapper \\d+\\]"), "[CAL_Wrapper #]"));
+                texts.push_back(std::to_string(t.iCategory) + "/" + std::to_string(t.iLevel) + " [CAL_Wrapper #" +
+                                t.text.substr(t.text.find(']')));
         sal.traces.clear();
         return texts;
     }

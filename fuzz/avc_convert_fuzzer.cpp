@@ -11,15 +11,6 @@
 
 #define CHECK(x) ((x) ? void() : __builtin_trap())
 
-namespace {
-
-int32_t PSs(uint8_t *d, int32_t n, const uint8_t *s, int32_t len, int32_t)
-{
-    return vorCALTools_AVC_ConvertFormatPSs(d, n, s, len);
-}
-
-} // namespace
-
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t *pData, size_t uSize)
 {
     vorcal::fuzz::Input in(pData, uSize);
@@ -32,7 +23,8 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *pData, size_t uSize)
     // Destination sizes: negative, tiny, around the source length, or generous.
     const int32_t iDst = std::array{-static_cast<int32_t>(uSel & 0xFF), static_cast<int32_t>(uSel % 16),
                                     iLen + static_cast<int32_t>(uSel % 64) - 32, iLen * 2 + 100}[uSel >> 30];
-    for (auto f : {vorCALTools_AVC_ConvertFormat, vorCALTools_AVC_ConvertFormat_NoSPSPPS, PSs}) {
+    auto PSs = [](uint8_t *d, int32_t n, const uint8_t *s, int32_t len, int32_t) { return vorCALTools_AVC_ConvertFormatPSs(d, n, s, len); };
+    for (auto f : {vorCALTools_AVC_ConvertFormat, vorCALTools_AVC_ConvertFormat_NoSPSPPS, +PSs}) {
         std::vector<uint8_t> dst(iDst > 0 ? static_cast<size_t>(iDst) : 0);
         const int32_t r = f(dst.empty() ? nullptr : dst.data(), iDst, src.data(), iLen, iNalSize);
         CHECK(r >= -1 && r <= (iDst > 0 ? iDst : 0));

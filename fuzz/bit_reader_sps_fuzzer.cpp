@@ -1,6 +1,7 @@
-// The header bit reader under arbitrary operation sequences, and vorCALTools_AVC_GetSPSInfo on
-// arbitrary data. Byte 0 selects a mode; the rest is the data (or operations, then data). The
-// data is an exact-size copy, so any load outside it is caught.
+// vorCALTools_AVC_GetSPSInfo on arbitrary data, and the header bit reader on the same data under
+// an operation sequence taken from its last bytes (byte 0 gives the count). The data is an
+// exact-size copy, so any load outside it is caught.
+#include <algorithm>
 #include <cstdint>
 #include <vector>
 
@@ -13,22 +14,17 @@
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t *pData, size_t uSize)
 {
     vorcal::fuzz::Input in(pData, uSize);
-    const uint8_t uMode = in.Byte();
-    std::vector<uint8_t> ops(uMode & 1 ? in.Byte() % 64 : 0);
-    for (uint8_t &op : ops)
-        op = in.Byte();
+    const size_t uOps = in.Byte() % 64;
     const std::vector<uint8_t> data(in.Rest(), in.Rest() + in.RestSize());
+    const int32_t iLen = static_cast<int32_t>(data.size());
     CALSPSInfo info{};
-    if (!(uMode & 1)) // a negative length is "too short"
-        CHECK(vorCALTools_AVC_GetSPSInfo(data.data(), static_cast<int32_t>(data.size()), &info) <= 3 &&
-              vorCALTools_AVC_GetSPSInfo(data.data(), -static_cast<int32_t>(data.size()) - 1, &info) == 1);
-    CALToolsBS bs{};
-    bs.pBuffer = data.data();
-    bs.uLength = static_cast<uint32_t>(data.size());
+    // A negative length is "too short".
+    CHECK(vorCALTools_AVC_GetSPSInfo(data.data(), iLen, &info) <= 3 && vorCALTools_AVC_GetSPSInfo(data.data(), -iLen - 1, &info) == 1);
+    CALToolsBS bs{0, 0, 0, data.data(), 0, static_cast<uint32_t>(iLen)};
     for (int i = 0; i < 4; ++i)
         _LoadBS(&bs);
-    for (uint8_t op : ops) {
-        const uint32_t n = op >> 3, uPeek = _ReadBitsMSB(&bs);
+    for (size_t k = 1; k <= std::min(uOps, data.size()); ++k) {
+        const uint32_t op = data[data.size() - k], n = op >> 3, uPeek = _ReadBitsMSB(&bs);
         switch (op & 7) {
         case 0: CHECK(_ReadNShiftBits(&bs, n) == (n == 0 ? 0 : uPeek >> (32 - n))); break;
         case 1: CHECK(_GetUE_V(&bs) != 0xFFFFFFFFu || uPeek != 0 || _ReadBitsMSB(&bs) == 0); break;

@@ -51,10 +51,6 @@ TEST(ConvertFormat, Table)
         EXPECT_TRUE(result <= 0 || (Into(f, src, out.size(), size).first == result && Into(f, src, out.size() - 1, size).first == -1))
             << "exact room and one byte less for " << testing::PrintToString(src);
     }
-}
-
-TEST(ConvertFormat, TracesAndSlicesOnly)
-{
     RecordingSal::Get().Reset();
     // A good unit, then a length field of 256 with 10 bytes after it.
     EXPECT_EQ(Into(vorCALTools_AVC_ConvertFormat, Cat({{0, 0, 0, 2, 0x65, 0x88, 0, 0, 1, 0}, Bytes(10, 0x55)}), 200).first, -1);

@@ -17,40 +17,34 @@ namespace {
 
 using namespace vorcal::test;
 
-struct Packet {
-    size_t offset = 0, size = 0;
-    bool key = false;
-};
-struct Report {
-    uint32_t width = 0, height = 0, level = 0;
-    std::vector<Packet> packets;
-};
-
 Bytes ReadAll(const std::string &name)
 {
     std::ifstream in(std::string(VORCAL_TEST_DATA_DIR) + "/h264/" + name, std::ios::binary);
     return Bytes((std::istreambuf_iterator<char>(in)), std::istreambuf_iterator<char>());
 }
 
-Report ReadReport(const std::string &name)
-{
-    std::ifstream in(std::string(VORCAL_TEST_DATA_DIR) + "/h264/" + name);
-    Report r;
-    for (std::string line, key; std::getline(in, line);) {
-        std::istringstream f(line);
-        std::string type;
-        Packet p;
-        f >> key;
-        if (key == "frame" && f >> p.offset >> p.size >> type >> p.key)
-            r.packets.push_back(p);
-        for (const auto &[name, field] : {std::pair{"width", &r.width}, {"height", &r.height}, {"level", &r.level}})
-            if (key == name)
-                f >> *field;
-    }
-    return r;
-}
+struct Stream {
+    uint32_t width = 0, height = 0, level = 0;
+    std::vector<std::pair<Bytes, bool>> packets; // bytes, key flag
+};
 
-Bytes Part(const Bytes &b, const Packet &p) { return Bytes(b.begin() + std::ptrdiff_t(p.offset), b.begin() + std::ptrdiff_t(p.offset + p.size)); }
+Stream Load(const std::string &name)
+{
+    const Bytes all = ReadAll(name);
+    std::ifstream in(std::string(VORCAL_TEST_DATA_DIR) + "/h264/" + name + ".txt");
+    Stream s;
+    for (std::string line, key, type; std::getline(in, line);) {
+        std::istringstream f(line);
+        size_t at = 0, size = 0;
+        bool bKey = false;
+        if (f >> key && key == "frame" && f >> at >> size >> type >> bKey && at + size <= all.size())
+            s.packets.emplace_back(Bytes(all.begin() + std::ptrdiff_t(at), all.begin() + std::ptrdiff_t(at + size)), bKey);
+        for (const auto &[field, value] : {std::pair{"width", &s.width}, {"height", &s.height}, {"level", &s.level}})
+            if (key == field)
+                f >> *value;
+    }
+    return s;
+}
 
 using Fn = int32_t (*)(uint8_t *, int32_t, const uint8_t *, int32_t, int32_t);
 int32_t PSs(uint8_t *d, int32_t n, const uint8_t *s, int32_t len, int32_t) { return vorCALTools_AVC_ConvertFormatPSs(d, n, s, len); }
@@ -64,36 +58,29 @@ Bytes Convert(const Bytes &src, Fn f = vorCALTools_AVC_ConvertFormat)
     return dst;
 }
 
-// Start-code stream, the same packets as length-prefixed samples with their configuration record,
-// and the profile.
+// A start-code stream; the same packets as length-prefixed samples, with their configuration
+// record; the profile.
 class Fixture : public testing::TestWithParam<std::tuple<std::string, std::string, uint32_t>> {
 protected:
-    const std::string a = std::get<0>(GetParam()), n = std::get<1>(GetParam());
+    const Stream annexB = Load(std::get<0>(GetParam())), samples = Load(std::get<1>(GetParam()) + ".nal");
+    const Bytes avcc = ReadAll(std::get<1>(GetParam()) + ".avcc");
     const uint32_t profile = std::get<2>(GetParam());
-    const Bytes annexB = ReadAll(a), samples = ReadAll(n + ".nal"), avcc = ReadAll(n + ".avcc");
-    const Report report = ReadReport(a + ".txt"), sampleReport = ReadReport(n + ".nal.txt");
-    const bool baseline = profile == 66;
-    void SetUp() override
-    {
-        ASSERT_GE(report.packets.size(), 8u);
-        ASSERT_EQ(report.packets.size(), sampleReport.packets.size());
-        ASSERT_EQ(annexB.size(), report.packets.back().offset + report.packets.back().size);
-    }
+    void SetUp() override { ASSERT_TRUE(annexB.packets.size() >= 8 && annexB.packets.size() == samples.packets.size()); }
 };
 
 TEST_P(Fixture, ParameterSetsMatchTheReportAndConvertBothWays)
 {
-    const Bytes ps = Convert(avcc, PSs);
-    const uint32_t codedW = (report.width + 15) / 16 * 16, codedH = (report.height + 15) / 16 * 16;
-    for (const Bytes *src : {&annexB, &ps}) {
+    const Bytes ps = Convert(avcc, PSs), stream = ReadAll(std::get<0>(GetParam()));
+    const uint32_t codedW = (annexB.width + 15) / 16 * 16, codedH = (annexB.height + 15) / 16 * 16;
+    for (const Bytes *src : {&stream, &ps}) {
         CALSPSInfo i{};
         ASSERT_EQ(vorCALTools_AVC_GetSPSInfo(src->data(), int32_t(src->size()), &i), 0u);
         EXPECT_EQ(std::tuple(i.uProfile, i.uLevel, i.uWidth, i.uHeight, i.uCropping, i.uCropBottom * 2),
-                  std::tuple(profile, report.level, codedW, codedH, uint32_t(codedH != report.height), codedH - report.height));
+                  std::tuple(profile, annexB.level, codedW, codedH, uint32_t(codedH != annexB.height), codedH - annexB.height));
     }
     // The record's SPS and PPS are the ones in front of the first picture; and back to the
     // compact list, which is the record without its first five bytes and reserved bits.
-    const Bytes first = Part(samples, sampleReport.packets[0]), psUnits = Convert(ps);
+    const Bytes &first = samples.packets[0].first, psUnits = Convert(ps);
     EXPECT_NE(std::search(first.begin(), first.end(), psUnits.begin(), psUnits.end()), first.end());
     EXPECT_EQ(Convert(ps, PSs), Cat({{uint8_t(avcc[5] & 0x1F)}, Bytes(avcc.begin() + 6, avcc.end())}));
 }
@@ -101,8 +88,9 @@ TEST_P(Fixture, ParameterSetsMatchTheReportAndConvertBothWays)
 TEST_P(Fixture, PacketsConvertAndCarryConfigurationRunsOnlyWhenKey)
 {
     size_t ambiguous = 0;
-    for (size_t k = 0; k < report.packets.size(); ++k) {
-        const Bytes au = Part(annexB, report.packets[k]), sample = Part(samples, sampleReport.packets[k]);
+    for (size_t k = 0; k < annexB.packets.size(); ++k) {
+        const auto &[au, key] = annexB.packets[k];
+        const Bytes &sample = samples.packets[k].first;
         EXPECT_EQ(Convert(au), sample) << k;
         // A sample whose first length field is 00 00 01 xx (a unit of 256 to 511 bytes, real in
         // small B pictures) reads as start-code framing and converts the wrong way.
@@ -111,15 +99,15 @@ TEST_P(Fixture, PacketsConvertAndCarryConfigurationRunsOnlyWhenKey)
         EXPECT_TRUE(bAmbiguous || Convert(Convert(sample)) == sample) << k;
         // Slices only: the key packets (and all Baseline ones, with SEI) lose units.
         const size_t slices = Convert(au, vorCALTools_AVC_ConvertFormat_NoSPSPPS).size();
-        EXPECT_TRUE(slices > 0 && (slices < sample.size()) == (report.packets[k].key || baseline)) << k;
+        EXPECT_TRUE(slices > 0 && (slices < sample.size()) == (key || profile == 66)) << k;
         // The encoder repeats SPS and PPS in front of every IDR picture and nowhere else.
         int32_t runB = -1, runN = -1;
         const uint8_t *pB = vorCALTools_AVC_ANNEXB_GetConfigStream(au.data(), int32_t(au.size()), &runB);
         const uint8_t *pN = vorCALTools_AVC_NAL_GetConfigStream(sample.data(), int32_t(sample.size()), 4, &runN);
-        EXPECT_EQ(std::pair(pB != nullptr, pN != nullptr), std::pair(report.packets[k].key, sampleReport.packets[k].key)) << k;
+        EXPECT_EQ(std::pair(pB != nullptr, pN != nullptr), std::pair(key, samples.packets[k].second)) << k;
         EXPECT_TRUE(!pB || !pN || Convert(Bytes(pB, pB + runB)) == Bytes(pN, pN + runN)) << k;
     }
-    EXPECT_LT(ambiguous, report.packets.size() / 2);
+    EXPECT_LT(ambiguous, annexB.packets.size() / 2);
 }
 
 // The third stream is the main one remuxed to start codes by another tool: its packets convert to

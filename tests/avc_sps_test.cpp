@@ -33,10 +33,7 @@ Bytes Build(const Sps &f)
         for (uint32_t i = 0; i < std::min(f.cycle, 3u); ++i)
             w.PutSE(-7 * int32_t(i));
     }
-    w.PutUE(f.refFrames).PutBit(0).PutUE(39).PutUE(f.heightMinus1).PutBit(f.frameMbsOnly);
-    if (!f.frameMbsOnly)
-        w.PutBit(1);
-    w.PutBit(1).PutBit(f.cropping);
+    w.PutUE(f.refFrames).PutBit(0).PutUE(39).PutUE(f.heightMinus1).PutBit(f.frameMbsOnly).Put(1, f.frameMbsOnly ? 0 : 1).PutBit(1).PutBit(f.cropping);
     if (f.cropping)
         w.PutUE(0).PutUE(0).PutUE(0).PutUE(f.cropBottom);
     if (w.PutBit(f.vui); f.vui) {
@@ -46,8 +43,7 @@ Bytes Build(const Sps &f)
             w.Put(f.sarW, 16).Put(f.sarH, 16);
         w.Put(0, 7); // the VUI flags after the aspect ratio
     }
-    w.Trailing();
-    return Cat({{0x67}, BitWriter::Escape(w.Bytes())});
+    return Cat({{0x67}, BitWriter::Escape(w.Trailing().Bytes())});
 }
 
 std::pair<uint32_t, Info> Parse(const Bytes &d)

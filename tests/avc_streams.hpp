@@ -34,9 +34,8 @@ inline Bytes LengthPrefixed(std::initializer_list<Bytes> units, int size)
 {
     Bytes out;
     for (const Bytes &u : units) {
-        for (int k = size - 1; k >= 0; --k)
-            out.push_back(static_cast<uint8_t>(u.size() >> (8 * k)));
-        out.insert(out.end(), u.begin(), u.end());
+        const Bytes field{uint8_t(u.size() >> 24), uint8_t(u.size() >> 16), uint8_t(u.size() >> 8), uint8_t(u.size())};
+        out = Cat({out, Bytes(field.end() - size, field.end()), u});
     }
     return out;
 }

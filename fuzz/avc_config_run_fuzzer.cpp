@@ -20,8 +20,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *pData, size_t uSize)
                            vorCALTools_AVC_NAL_GetConfigStream(d.data(), iLen, iSize, &iRun[1])};
     for (int i = 0; i < 2; ++i)
         CHECK(p[i] ? p[i] >= d.data() && iRun[i] >= 0 && p[i] + iRun[i] <= d.data() + d.size() : iRun[i] == 0);
-    const int32_t iFrame = vorCALTools_AVC_GetOneFrame(d.data(), iLen);
-    CHECK(iFrame >= 0 && iFrame <= iLen);
+    CHECK(static_cast<uint32_t>(vorCALTools_AVC_GetOneFrame(d.data(), iLen)) <= static_cast<uint32_t>(iLen)); // 0 .. iLen
     // Every walk moves forward and ends.
     for (int32_t s = -1; s <= 6; ++s) {
         for (int32_t iPos = 0, iNext; iPos >= 0; iPos = iNext) {

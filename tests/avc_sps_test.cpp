@@ -15,8 +15,7 @@ using Info = std::array<uint32_t, 11>; // CALSPSInfo field by field
 constexpr uint32_t U = 0xA5A5A5A5u;     // a field the call must not write
 
 struct Sps {
-    uint32_t profile = 66, level = 30, spsId = 0, pocType = 0, cycle = 0, refFrames = 1;
-    uint32_t heightMinus1 = 29, frameMbsOnly = 1, cropBottom = 0;
+    uint32_t profile = 66, level = 30, spsId = 0, pocType = 0, cycle = 0, refFrames = 1, heightMinus1 = 29, frameMbsOnly = 1, cropBottom = 0;
     bool cropping = false, vui = false, aspectInfo = false;
     uint32_t aspectIdc = 255, sarW = 0, sarH = 0, constraints = 0xC0;
 };

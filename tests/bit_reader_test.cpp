@@ -1,7 +1,5 @@
 #include <gtest/gtest.h>
 
-#include <vector>
-
 #include <vorcal/video_tools.h>
 
 #include "avc_streams.hpp"

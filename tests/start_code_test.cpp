@@ -11,8 +11,7 @@
 
 namespace {
 
-using vorcal::tools::FindStartCodePrefix;
-using vorcal::tools::FindStartCodePrefixCopy;
+using namespace vorcal::tools;
 
 TEST(FindStartCodePrefix, BothVariantsMatchReferenceOnRandomData)
 {

@@ -76,7 +76,6 @@ Bytes RandomAnnexB(std::mt19937 &rng)
 }
 
 // Towards length prefixes, from the framing rules alone: a unit runs to the next start code
-// that begins at least 4 bytes before the end.
 // that begins at least 4 bytes before the end. Empty: the conversion fails.
 Bytes ReferenceToLength(const Bytes &s, bool slicesOnly)
 {

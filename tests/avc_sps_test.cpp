@@ -1,8 +1,8 @@
 #include <gtest/gtest.h>
 
-#include <algorithm>
 #include <array>
 #include <bit>
+#include <tuple>
 
 #include <vorcal/video_tools.h>
 
@@ -29,7 +29,7 @@ Bytes Build(const Sps &f)
         w.PutUE(2);
     if (f.pocType == 1) {
         w.PutBit(0).PutSE(-3).PutSE(5).PutUE(f.cycle);
-        for (uint32_t i = 0; i < std::min(f.cycle, 3u); ++i)
+        for (uint32_t i = 0; i < f.cycle && i < 3; ++i)
             w.PutSE(-7 * int32_t(i));
     }
     w.PutUE(f.refFrames).PutBit(0).PutUE(39).PutUE(f.heightMinus1).PutBit(f.frameMbsOnly).Put(1, f.frameMbsOnly ? 0 : 1).PutBit(1).PutBit(f.cropping);

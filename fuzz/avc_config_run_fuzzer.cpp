@@ -7,24 +7,7 @@
 
 #include "fuzz_sal.hpp"
 
-namespace {
-
-void Check(bool ok)
-{
-    if (!ok)
-        __builtin_trap();
-}
-
-void CheckRun(const uint8_t *p, int32_t iRun, const std::vector<uint8_t> &d)
-{
-    if (p == nullptr) {
-        Check(iRun == 0);
-        return;
-    }
-    Check(p >= d.data() && iRun >= 0 && p + iRun <= d.data() + d.size());
-}
-
-} // namespace
+#define CHECK(x) ((x) ? void() : __builtin_trap())
 
 extern "C" int LLVMFuzzerTestOneInput(const uint8_t *pData, size_t uSize)
 {
@@ -32,24 +15,17 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *pData, size_t uSize)
     const int32_t iSize = static_cast<int32_t>(in.Byte() % 8) - 1; // -1 .. 6
     const std::vector<uint8_t> d(in.Rest(), in.Rest() + in.RestSize());
     const int32_t iLen = static_cast<int32_t>(d.size());
-
-    int32_t iRun = -5;
-    const uint8_t *p = vorCALTools_AVC_ANNEXB_GetConfigStream(d.data(), iLen, &iRun);
-    CheckRun(p, iRun, d);
-    iRun = -5;
-    p = vorCALTools_AVC_NAL_GetConfigStream(d.data(), iLen, iSize, &iRun);
-    CheckRun(p, iRun, d);
-
-    const int32_t iFrame = vorCALTools_AVC_GetOneFrame(d.data(), iLen);
-    Check(iFrame >= 0 && iFrame <= iLen);
-
+    int32_t iRun[2] = {-5, -5};
+    const uint8_t *p[2] = {vorCALTools_AVC_ANNEXB_GetConfigStream(d.data(), iLen, &iRun[0]),
+                           vorCALTools_AVC_NAL_GetConfigStream(d.data(), iLen, iSize, &iRun[1])};
+    for (int i = 0; i < 2; ++i)
+        CHECK(p[i] ? p[i] >= d.data() && iRun[i] >= 0 && p[i] + iRun[i] <= d.data() + d.size() : iRun[i] == 0);
+    CHECK(static_cast<uint32_t>(vorCALTools_AVC_GetOneFrame(d.data(), iLen)) <= static_cast<uint32_t>(iLen)); // 0 .. iLen
     // Every walk moves forward and ends.
     for (int32_t s = -1; s <= 6; ++s) {
-        int32_t iPos = 0;
-        while (iPos >= 0) {
-            const int32_t iNext = _NEXT_NAL_(d.data(), iLen, iPos, s);
-            Check(iNext == -1 || (iNext > iPos && iNext < iLen));
-            iPos = iNext;
+        for (int32_t iPos = 0, iNext; iPos >= 0; iPos = iNext) {
+            iNext = _NEXT_NAL_(d.data(), iLen, iPos, s);
+            CHECK(iNext == -1 || (iNext > iPos && iNext < iLen));
         }
     }
     return 0;

@@ -1,162 +1,65 @@
 #include <gtest/gtest.h>
 
-#include <random>
+#include <tuple>
 
 #include <vorcal/video_tools.h>
 
 #include "avc_streams.hpp"
-#include "recording_sal.hpp"
 
 namespace {
 
 using namespace vorcal::test;
 
-struct FormatCase {
-    Bytes data;
-    int32_t expected;
-};
+int32_t Len(const Bytes &d) { return static_cast<int32_t>(d.size()); }
 
-class CheckFormat : public testing::TestWithParam<FormatCase> {};
-
-TEST_P(CheckFormat, Table)
+TEST(AvcFraming, CheckFormatAndFindStartCodeTables)
 {
-    const FormatCase &c = GetParam();
-    EXPECT_EQ(vorCALTools_AVC_CheckFormat(c.data.data(), static_cast<int32_t>(c.data.size())), c.expected);
+    const std::pair<Bytes, int32_t> formats[] = {
+        {{}, 0}, {{0, 0, 1}, 0}, {{0, 0, 1, 0x67}, 2}, {{0, 0, 0, 1}, 2}, {{0, 0, 0, 0}, 1},
+        {{0, 0, 2, 0}, 1}, {{0, 0, 0, 0x1C}, 1}, {{0x01, 0x42, 0xC0, 0x1E}, 1}, {{0, 1, 0, 0, 1}, 1}};
+    for (const auto &[d, expected] : formats)
+        EXPECT_EQ(vorCALTools_AVC_CheckFormat(d.data(), Len(d)), expected) << testing::PrintToString(d);
+    // The 4-byte form is tested first at each offset and may end on the last byte; the 3-byte
+    // form may not.
+    const std::pair<Bytes, int32_t> searches[] = {
+        {{0x41, 0, 0, 0, 1, 0x65}, 1}, {{0x41, 0, 0, 1, 0x65}, 1}, {{0, 0, 1}, -1},
+        {{0x11, 0x22, 0, 0, 1}, -1}, {{0x11, 0, 0, 0, 1}, 1}, {{0, 0, 0, 0, 0, 1, 9}, 2}};
+    for (const auto &[d, expected] : searches)
+        EXPECT_EQ(vorCALTools_AVC_FindStartCode(d.data(), Len(d)), expected) << testing::PrintToString(d);
 }
 
-INSTANTIATE_TEST_SUITE_P(
-    Framings, CheckFormat,
-    testing::Values(FormatCase{{}, 0}, FormatCase{{0, 0, 1}, 0}, FormatCase{{0, 0, 1, 0x67}, 2},
-                    FormatCase{{0, 0, 0, 1}, 2}, FormatCase{{0, 0, 0, 0}, 1}, FormatCase{{0, 0, 2, 0}, 1},
-                    FormatCase{{0, 0, 0, 0x1C}, 1}, FormatCase{{0x01, 0x42, 0xC0, 0x1E}, 1},
-                    FormatCase{{0, 1, 0, 0, 1}, 1}));
-
-// The search as the framing defines it: at each offset below length - 3 the 4-byte form first.
-int32_t ReferenceFindStartCode(const Bytes &d)
+TEST(AvcFraming, NextNalEverySizeAndEveryWayOut)
 {
-    const int32_t n = static_cast<int32_t>(d.size());
-    for (int32_t i = 0; i < n - 3; ++i) {
-        if (d[i] == 0 && d[i + 1] == 0 && d[i + 2] == 0 && d[i + 3] == 1)
-            return i;
-        if (d[i] == 0 && d[i + 1] == 0 && d[i + 2] == 1)
-            return i;
+    const Bytes five{0, 0, 0, 5, 1, 2, 3, 4, 5}, zeros(7, 0);
+    const std::tuple<Bytes, int32_t, int32_t, int32_t> cases[] = {
+        {Cat({five, {7}}), 0, 4, 9}, {five, 0, 4, -1}, {{0, 0, 2, 9, 9, 7}, 0, 3, 5},
+        {{0, 2, 9, 9, 7}, 0, 2, 4}, {{9, 2, 9, 9, 7}, 1, 1, 4},
+        {zeros, 0, 0, -1}, {zeros, 0, 5, -1},                  // refused sizes end every walk
+        {{0xFF, 0xFF, 0xFF, 0xFE, 0, 0, 0, 0, 0}, 0, 4, -1}, // no wrap-around to a small offset
+        {{0, 1, 0, 9}, -1, 2, -1}, {{0, 1, 0, 9}, 4, 2, -1}, {{0, 0, 0, 0, 0}, 3, 4, -1}};
+    for (const auto &[d, pos, size, expected] : cases)
+        EXPECT_EQ(_NEXT_NAL_(d.data(), Len(d), pos, size), expected) << testing::PrintToString(d) << " " << pos << " " << size;
+}
+
+TEST(AvcFraming, GetOneFrameEndsAtTheSliceWithANewKey)
+{
+    for (const auto &[keyA, keyB, code] : {std::tuple{0u, 1u, 4}, {0u, 1u, 3}, {3u, 3u, 4}, {7u, 7u, 3}}) {
+        const Bytes first = AnnexB({kSps, kPps, Slice(0x65, keyA)}, code);
+        const Bytes all = Cat({first, AnnexB({Slice(0x41, keyB)}, code)});
+        EXPECT_EQ(vorCALTools_AVC_GetOneFrame(all.data(), Len(all)), keyA != keyB ? Len(first) : Len(all));
     }
-    return -1;
-}
-
-struct SearchCase {
-    Bytes data;
-    int32_t expected;
-};
-
-class FindStartCode : public testing::TestWithParam<SearchCase> {};
-
-TEST_P(FindStartCode, Table)
-{
-    const SearchCase &c = GetParam();
-    EXPECT_EQ(vorCALTools_AVC_FindStartCode(c.data.data(), static_cast<int32_t>(c.data.size())), c.expected);
-}
-
-INSTANTIATE_TEST_SUITE_P(
-    Offsets, FindStartCode,
-    testing::Values(SearchCase{{0x41, 0, 0, 0, 1, 0x65}, 1}, SearchCase{{0x41, 0, 0, 1, 0x65}, 1},
-                    SearchCase{{0, 0, 1}, -1}, SearchCase{{0x11, 0x22, 0, 0, 1}, -1},
-                    // The 4-byte form may end on the last byte; the 3-byte form may not.
-                    SearchCase{{0x11, 0, 0, 0, 1}, 1}, SearchCase{{0, 0, 0, 0, 0, 1, 9}, 2},
-                    SearchCase{{0, 0, 1, 0x65}, 0}, SearchCase{{0, 0, 2, 0, 0, 2, 0}, -1}));
-
-TEST(FindStartCode, MatchesReferenceOnRandomData)
-{
-    std::mt19937 rng(7);
-    for (int round = 0; round < 5000; ++round) {
-        Bytes d(rng() % 80);
-        for (auto &b : d)
-            b = static_cast<uint8_t>(rng() % 3 == 0 ? rng() % 2 : rng());
-        ASSERT_EQ(vorCALTools_AVC_FindStartCode(d.data(), static_cast<int32_t>(d.size())), ReferenceFindStartCode(d));
-    }
-}
-
-struct NextNalCase {
-    Bytes data;
-    int32_t pos;
-    int32_t size;
-    int32_t expected;
-};
-
-class NextNal : public testing::TestWithParam<NextNalCase> {};
-
-TEST_P(NextNal, Table)
-{
-    const NextNalCase &c = GetParam();
-    EXPECT_EQ(_NEXT_NAL_(c.data.data(), static_cast<int32_t>(c.data.size()), c.pos, c.size), c.expected);
-}
-
-const Bytes kFive{0, 0, 0, 5, 1, 2, 3, 4, 5};
-INSTANTIATE_TEST_SUITE_P(
-    Sizes, NextNal,
-    testing::Values(NextNalCase{Cat({kFive, {7}}), 0, 4, 9}, NextNalCase{kFive, 0, 4, -1},
-                    NextNalCase{{0, 0, 2, 9, 9, 7}, 0, 3, 5}, NextNalCase{{0, 2, 9, 9, 7}, 0, 2, 4},
-                    NextNalCase{{2, 9, 9, 7}, 0, 1, 3}, NextNalCase{{9, 2, 9, 9, 7}, 1, 1, 4},
-                    // Refused sizes end every walk.
-                    NextNalCase{{0, 0, 0, 0, 0, 0, 0}, 0, 0, -1}, NextNalCase{{0, 0, 0, 0, 0, 0, 0}, 0, 5, -1},
-                    NextNalCase{{0, 0, 0, 0, 0, 0, 0}, 0, -2, -1},
-                    // A huge length never wraps around to a small offset.
-                    NextNalCase{{0xFF, 0xFF, 0xFF, 0xFE, 0, 0, 0, 0, 0}, 0, 4, -1},
-                    NextNalCase{{0x7F, 0xFF, 0xFF, 0xFF, 0, 0, 0}, 0, 4, -1},
-                    // Positions outside the data, and a length field cut by the end.
-                    NextNalCase{{0, 1, 0, 9}, -1, 2, -1}, NextNalCase{{0, 1, 0, 9}, 4, 2, -1},
-                    NextNalCase{{0, 0, 0, 0, 0}, 3, 4, -1}));
-
-// GetOneFrame on SPS, PPS, IDR slice with key A, slice with key B.
-struct OneFrameCase {
-    uint32_t keyA;
-    uint32_t keyB;
-    int codeLength;
-};
-
-class GetOneFrame : public testing::TestWithParam<OneFrameCase> {};
-
-TEST_P(GetOneFrame, EndsAtTheSliceWithANewKey)
-{
-    const OneFrameCase &c = GetParam();
-    const Bytes first = AnnexB({kSps, kPps, Slice(0x65, c.keyA)}, {c.codeLength});
-    const Bytes all = Cat({first, AnnexB({Slice(0x41, c.keyB)}, {c.codeLength})});
-    const int32_t n = static_cast<int32_t>(all.size());
-    EXPECT_EQ(vorCALTools_AVC_GetOneFrame(all.data(), n), c.keyA != c.keyB ? static_cast<int32_t>(first.size()) : n);
-}
-
-INSTANTIATE_TEST_SUITE_P(Keys, GetOneFrame,
-                         testing::Values(OneFrameCase{0, 1, 4}, OneFrameCase{0, 1, 3}, OneFrameCase{3, 3, 4},
-                                         OneFrameCase{5, 2, 3}, OneFrameCase{7, 7, 3}));
-
-TEST(GetOneFrame, PartitionsAndAuxiliarySlicesCount)
-{
-    Bytes partition = Slice(0x41, 4);
-    partition[0] = 0x22; // nal_unit_type 2
-    Bytes aux = Slice(0x41, 9);
-    aux[0] = 0x13; // nal_unit_type 19
-    const Bytes first = AnnexB({Slice(0x65, 4)});
-    const Bytes a = Cat({first, AnnexB({partition, aux})});
-    // The partition carries the same key; the auxiliary slice starts the next picture.
-    EXPECT_EQ(vorCALTools_AVC_GetOneFrame(a.data(), static_cast<int32_t>(a.size())),
-              static_cast<int32_t>(first.size() + 4 + partition.size()));
-}
-
-TEST(GetOneFrame, NoValidCodeEndsAtOnce)
-{
-    // A slice whose four codes run into 32 zero bits: key 0xFFFFFFFF ends the frame there.
-    const Bytes a = AnnexB({kSps, Bytes{0x65, 0x00, 0x00, 0x00, 0x00, 0x00, 0x80}});
-    EXPECT_EQ(vorCALTools_AVC_GetOneFrame(a.data(), static_cast<int32_t>(a.size())), 13);
-}
-
-TEST(GetOneFrame, WholeLengthCases)
-{
-    const Bytes lengthPrefixed = LengthPrefixed({kSps, Slice(0x65, 0), Slice(0x41, 1)}, 4);
-    EXPECT_EQ(vorCALTools_AVC_GetOneFrame(lengthPrefixed.data(), static_cast<int32_t>(lengthPrefixed.size())),
-              static_cast<int32_t>(lengthPrefixed.size()));
-    const Bytes shortOne{0, 0, 1, 0x65, 0x88};
-    EXPECT_EQ(vorCALTools_AVC_GetOneFrame(shortOne.data(), 5), 5);
-    EXPECT_EQ(vorCALTools_AVC_GetOneFrame(shortOne.data(), -3), -3);
+    // A partition (type 2) with the same key stays; an auxiliary slice (type 19) with a new one ends it.
+    auto retyped = [](Bytes u, uint8_t header) { u[0] = header; return u; };
+    const Bytes first = AnnexB({Slice(0x65, 4)}), partition = AnnexB({retyped(Slice(0x41, 4), 0x22)});
+    const Bytes parts = Cat({first, partition, AnnexB({retyped(Slice(0x41, 9), 0x13)})});
+    EXPECT_EQ(vorCALTools_AVC_GetOneFrame(parts.data(), Len(parts)), Len(first) + Len(partition));
+    // Four codes running into 32 zero bits give no valid key: the frame ends there.
+    const Bytes noKey = AnnexB({kSps, Bytes{0x65, 0x00, 0x00, 0x00, 0x00, 0x00, 0x80}});
+    EXPECT_EQ(vorCALTools_AVC_GetOneFrame(noKey.data(), Len(noKey)), 13);
+    // Not start-code framed, too short or negative: the whole length.
+    const Bytes lp = LengthPrefixed({kSps, Slice(0x65, 0), Slice(0x41, 1)}, 4), tiny{0, 0, 1, 0x65, 0x88};
+    EXPECT_EQ(vorCALTools_AVC_GetOneFrame(lp.data(), Len(lp)), Len(lp));
+    EXPECT_EQ(std::pair(vorCALTools_AVC_GetOneFrame(tiny.data(), 5), vorCALTools_AVC_GetOneFrame(tiny.data(), -3)), std::pair(5, -3));
 }
 
 } // namespace

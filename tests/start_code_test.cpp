@@ -48,4 +48,25 @@ TEST(FindStartCodePrefix, BothVariantsMatchReferenceOnRandomData)
     }
 }
 
+TEST(FindStartCodePrefix, LargeFramesAcrossChunkAndBlockEdges)
+{
+    // Frames of several kilobytes reach the strided screen, the prefetch and the 4 KB chunks of
+    // the copying search; prefixes are planted across a chunk edge, a block edge and the end.
+    std::mt19937 rng(7);
+    for (int round = 0; round < 300; ++round) {
+        std::vector<uint8_t> d(4096 + rng() % 9000);
+        for (auto &b : d)
+            b = static_cast<uint8_t>(rng() | 2);
+        const size_t edges[] = {4094, 4095, 4096, 128 * (rng() % 60) + 127, d.size() - 3};
+        const size_t at = edges[round % 5] - rng() % 2;
+        d[at] = d[at + 1] = 0;
+        d[at + 2] = 1;
+        const size_t from = rng() % 3 == 0 ? 0 : rng() % at;
+        ASSERT_EQ(FindStartCodePrefix(d.data(), from, d.size()), at) << round;
+        std::vector<uint8_t> dst(d.size());
+        ASSERT_EQ(FindStartCodePrefixCopy(d.data(), from, d.size(), dst.data(), dst.size()), at) << round;
+        ASSERT_TRUE(std::equal(d.begin() + from, d.begin() + at, dst.begin())) << round;
+    }
+}
+
 } // namespace

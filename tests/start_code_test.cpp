@@ -54,10 +54,10 @@ TEST(FindStartCodePrefix, LargeFramesAcrossChunkAndBlockEdges)
     // the copying search; prefixes are planted across a chunk edge, a block edge and the end.
     std::mt19937 rng(7);
     for (int round = 0; round < 300; ++round) {
-        std::vector<uint8_t> d(4096 + rng() % 9000);
+        std::vector<uint8_t> d(4200 + rng() % 9000);
         for (auto &b : d)
             b = static_cast<uint8_t>(rng() | 2);
-        const size_t edges[] = {4094, 4095, 4096, 128 * (rng() % 60) + 127, d.size() - 3};
+        const size_t edges[] = {4094, 4095, 4096, 128 * (rng() % (d.size() / 128 - 1)) + 127, d.size() - 3};
         const size_t at = edges[round % 5] - rng() % 2;
         d[at] = d[at + 1] = 0;
         d[at + 2] = 1;

@@ -11,8 +11,6 @@
 namespace vorcal::tools {
 namespace {
 
-constexpr uint32_t kOtiAAC = 0x40;
-constexpr uint32_t kOtiAACSBR = 0x41;
 constexpr uint32_t kFailed = 0xFFFFFFFF;
 constexpr uint32_t kAdtsBytes = 7;
 // VrAACSBRInfo reads 10 bytes of a header without CRC: frames under 2 bytes get extra zeros.
@@ -26,7 +24,7 @@ uint32_t GetAACType(CALCodec *hCodec, int32_t iSamplingRate, uint32_t uChannels,
     if (!hCodec)
         return kFailed;
     const uint32_t uOti = hCodec->m_uCodecObjectTypeIndication;
-    if ((uOti != kOtiAAC && uOti != kOtiAACSBR) || !pFrame)
+    if ((uOti != CAL_OTI_AAC && uOti != CAL_OTI_AAC_SBR) || !pFrame)
         return uOti;
     if (uFrameLen > UINT32_MAX - (kAdtsBytes + 1))
         return kFailed; // no buffer of that size can exist
@@ -47,7 +45,7 @@ uint32_t GetAACType(CALCodec *hCodec, int32_t iSamplingRate, uint32_t uChannels,
     sal::Free(pBuf);
     VORCAL_TRACE(kTraceAudio, 1, "[CAL_Tools %d] vorCALTools_GetAACType() : %u, %u, %u, %u, %u\n", 562, uRate,
                  uChannelConfig, uSBR, uBitsAligned, uHeaderBits);
-    hCodec->m_uCodecObjectTypeIndication = uSBR ? kOtiAACSBR : kOtiAAC;
+    hCodec->m_uCodecObjectTypeIndication = uSBR ? CAL_OTI_AAC_SBR : CAL_OTI_AAC;
     return hCodec->m_uCodecObjectTypeIndication;
 }
 

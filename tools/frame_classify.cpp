@@ -8,6 +8,7 @@
 #include <cstdint>
 
 #include <vorcal/video_tools.h>
+#include <vorcal/wrapper.h>
 
 #include "core/sal.hpp"
 #include "tools/bit_reader.hpp"
@@ -15,27 +16,6 @@
 
 namespace vorcal::tools::classify {
 namespace {
-
-constexpr uint32_t kOtiMpeg4Visual = 0x20;
-constexpr uint32_t kOtiMpeg4Visual2 = 0xF1;
-constexpr uint32_t kOtiH263 = 0xC0;
-constexpr uint32_t kOtiH264 = 0xC1;
-constexpr uint32_t kOtiH263Family = 0xC2;
-constexpr uint32_t kOtiIntraOnly = 0xDB;
-constexpr uint32_t kOtiMpeg12Video = 0xF2;
-
-constexpr uint32_t FourCC(char a, char b, char c, char d)
-{
-    return uint32_t(uint8_t(a)) | uint32_t(uint8_t(b)) << 8 | uint32_t(uint8_t(c)) << 16 |
-           uint32_t(uint8_t(d)) << 24;
-}
-constexpr uint32_t kFccWmv1 = FourCC('W', 'M', 'V', '1');
-constexpr uint32_t kFccWmv2 = FourCC('W', 'M', 'V', '2');
-constexpr uint32_t kFccMp43 = FourCC('M', 'P', '4', '3');
-constexpr uint32_t kFccWmv3 = FourCC('W', 'M', 'V', '3');
-constexpr uint32_t kFccWvc1 = FourCC('W', 'V', 'C', '1');
-static_assert(kFccWmv1 == 0x31564D57 && kFccWmv2 == 0x32564D57 && kFccMp43 == 0x3334504D);
-static_assert(kFccWmv3 == 0x33564D57 && kFccWvc1 == 0x31435657);
 
 constexpr uint8_t kVopStartCode = 0xB6;     // ISO/IEC 14496-2 6.2.5
 constexpr uint8_t kPictureStartCode = 0x00; // ISO/IEC 13818-2 6.2.3
@@ -46,7 +26,7 @@ constexpr uint32_t kNalSliceIdr = 5;
 
 bool IsMpeg4Visual(uint32_t uOTI)
 {
-    return uOTI == kOtiMpeg4Visual || uOTI == kOtiMpeg4Visual2;
+    return uOTI == CAL_OTI_MPEG4_VISUAL || uOTI == CAL_OTI_MPEG4_VISUAL_2;
 }
 
 // Offset of the first start code 00 00 01 <uCode> that begins at an offset from uFrom to uLast,
@@ -241,26 +221,26 @@ int IsIntraFrame(uint32_t uOTI, const uint8_t *p, int32_t iLen, CALParam uExtra)
         return 0;
     }
     switch (uOTI) {
-    case kOtiMpeg4Visual:
-    case kOtiMpeg4Visual2:
+    case CAL_OTI_MPEG4_VISUAL:
+    case CAL_OTI_MPEG4_VISUAL_2:
         return FirstVopCodingType(p, iLen) == 0 ? 1 : 0;
-    case kOtiH263:
+    case CAL_OTI_H263:
         return IsIntraH263(p, iLen);
-    case kOtiH264:
+    case CAL_OTI_H264:
         return IsIntraH264(p, iLen, uExtra);
-    case kOtiH263Family:
+    case CAL_OTI_H263_FAMILY:
         return IsIntraH263Family(p, iLen);
-    case kOtiIntraOnly:
+    case CAL_OTI_INTRA_ONLY:
         return 1;
-    case kOtiMpeg12Video:
+    case CAL_OTI_MPEG12_VIDEO:
         return IsIntraMpeg12(p, iLen);
-    case kFccWmv1:
-    case kFccWmv2:
-    case kFccMp43:
+    case CAL_OTI_WMV1:
+    case CAL_OTI_WMV2:
+    case CAL_OTI_MP43:
         // The first two bits of the picture header are the picture type: 00 is intra.
         return iLen > 0 && (p[0] & 0xC0) == 0 ? 1 : 0;
-    case kFccWmv3:
-    case kFccWvc1: {
+    case CAL_OTI_WMV3:
+    case CAL_OTI_WVC1: {
         const auto *pSeqHeader = reinterpret_cast<const uint8_t *>(uExtra);
         if (pSeqHeader == nullptr || iLen < 0)
             return 0;
@@ -310,12 +290,12 @@ int IsValidFrame(uint32_t uOTI, const uint8_t *p, int32_t iLen)
         // Start codes up to the VOP start code, and 0xC3, may open an MPEG-4 Visual frame.
         return (p[3] <= kVopStartCode || p[3] == 0xC3) ? 1 : 0;
     }
-    if (uOTI == kOtiH263) {
+    if (uOTI == CAL_OTI_H263) {
         if (p == nullptr || iLen <= 6)
             return 0;
         return (p[0] == 0 && p[1] == 0 && (p[2] & 0xFC) == 0x80) ? 1 : 0;
     }
-    if (uOTI == kOtiH264)
+    if (uOTI == CAL_OTI_H264)
         return IsValidH264(p, iLen);
     return 1;
 }

@@ -14,10 +14,7 @@
 extern "C" {
 #endif
 
-#ifndef VORCAL_CALPARAM_DEFINED
-#define VORCAL_CALPARAM_DEFINED
-typedef uintptr_t CALParam;
-#endif
+/* CALParam, the pointer-sized pass-through value, comes from vorcal/vorsal.h. */
 
 /* One slot of a codec function table; each slot is called through the signature of its kind
  * (see vorcal/wrapper.h). */

@@ -5,8 +5,8 @@
 set -eu
 out="$1/aac"
 mkdir -p "$out"
-for spec in 44100:1 44100:2 48000:2 22050:1 8000:2; do
-  rate=${spec%:*} ch=${spec#*:}
+for rate_channels in 44100:1 44100:2 48000:2 22050:1 8000:2; do
+  rate=${rate_channels%:*} ch=${rate_channels#*:}
   ffmpeg -hide_banner -loglevel error -y -f lavfi -i "sine=frequency=440:sample_rate=$rate:duration=0.6" \
     -ac "$ch" -c:a aac -b:a 48k -f adts "$out/sine_${rate}_${ch}ch.aac"
 done

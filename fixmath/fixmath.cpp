@@ -185,7 +185,7 @@ extern "C" void Mul_exp(int32_t e1, int32_t f1, int32_t e2, int32_t f2, int32_t 
 {
     // 32-bit arithmetic throughout.
     const int32_t C = To32(int64_t{To32(int64_t{e1} * f2)} + To32(int64_t{f1} * e2));
-    int32_t F = To32(int64_t{To32(int64_t{f1} * f2 * 2) >> 16} + (C & 0x7FFF));
+    int32_t F = To32(int64_t{To32(int64_t{To32(int64_t{f1} * f2)} * 2) >> 16} + (C & 0x7FFF));
     int32_t E = To32(int64_t{To32(int64_t{e1} * e2)} + (To32(int64_t{C} * 2) >> 16));
     if (F >= 32768) {
         E = To32(int64_t{E} + (To32(int64_t{F} * 2) >> 16));

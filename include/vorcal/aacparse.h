@@ -7,13 +7,7 @@
 
 #include <stdint.h>
 
-#ifndef VORCAL_API
-#if defined(__GNUC__)
-#define VORCAL_API __attribute__((visibility("default")))
-#else
-#define VORCAL_API
-#endif
-#endif
+#include <vorcal/export.h>
 
 #ifdef __cplusplus
 extern "C" {

@@ -4,6 +4,7 @@
 #ifndef VORCAL_VORCAL_H
 #define VORCAL_VORCAL_H
 
+#include <vorcal/export.h>
 #include <vorcal/vorsal.h>
 #include <vorcal/core.h>
 #include <vorcal/wrapper.h>

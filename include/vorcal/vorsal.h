@@ -11,19 +11,8 @@
 
 #include <stdint.h>
 
-#ifndef VORCAL_API
-#if defined(__GNUC__)
-#define VORCAL_API __attribute__((visibility("default")))
-#else
-#define VORCAL_API
-#endif
-#endif
+#include <vorcal/export.h>
 
-#if defined(__GNUC__)
-#define VORCAL_PRINTF(fmt, args) __attribute__((format(printf, fmt, args)))
-#else
-#define VORCAL_PRINTF(fmt, args)
-#endif
 
 #ifdef __cplusplus
 extern "C" {

@@ -50,7 +50,7 @@ VORCAL_API int32_t _AlignBits(CALToolsBS *pBS);
 /* Loads n bytes, bit position unchanged; 1 when a load reached the end, 0 for n <= 0. */
 VORCAL_API int32_t _ShiftBytes(CALToolsBS *pBS, int32_t n);
 
-/* Big-endian fields. */
+/* Big-endian fields; they take no length and read 2, 3 and 4 bytes at p. */
 VORCAL_API uint32_t vorCALTools_ReadBigEndianValue16(const uint8_t *p);
 VORCAL_API uint32_t vorCALTools_ReadBigEndianValue24(const uint8_t *p);
 VORCAL_API uint32_t vorCALTools_ReadBigEndianValue32(const uint8_t *p);
@@ -142,7 +142,8 @@ typedef struct CALAVCSPS {
 VORCAL_API int32_t vorCALTools_AVC_ParseSPS(const uint8_t *pData, int32_t iLen, CALAVCSPS *pSPS);
 
 /* Frame classification. uExtra: the NAL length size for H.264, a pointer to the 4-byte
- * sequence header for WMV3 and WVC1. */
+ * sequence header for WMV3 and WVC1 (4 readable bytes: its fourth is read, no length is
+ * passed). */
 VORCAL_API int32_t vorCALTools_IsIDRFrame(uint32_t uOTI, const uint8_t *pFrame, int32_t iFrameLen,
                                           CALParam uExtra);
 /* 1 for an MPEG-4 Visual B-VOP. */

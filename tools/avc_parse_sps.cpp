@@ -26,7 +26,7 @@ public:
         uint64_t v = 0;
         while (n > 0) {
             if (left_ == 0 && !Fetch()) {
-                overrun_ = !bad_;
+                overrun_ = overrun_ || !bad_;
                 return static_cast<uint32_t>(v << n);
             }
             const uint32_t uTake = n < left_ ? n : left_;

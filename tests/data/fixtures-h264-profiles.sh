@@ -73,10 +73,11 @@ stream odd_1918x1078 color=c=gray: 1918x1078 1 -pix_fmt yuv420p -c:v libx264 -cr
 stream fullrange_64x48 testsrc2= 64x48 2 -pix_fmt yuvj420p -colorspace bt709 -color_primaries bt709 \
   -color_trc bt709 -c:v libx264 -b:v 100k -maxrate 100k -bufsize 100k -x264-params nal-hrd=vbr
 
-# The stream-aware session: P pictures under a tight rate, 4 slices each.
+# The stream-aware session: P pictures under a tight rate, 4 slices each (one encoder thread,
+# so that the rate control gives the same bytes on every run).
 name=trust_160x96
 ffmpeg -y -loglevel error -f lavfi -i "testsrc2=size=160x96:rate=25" -frames:v 24 -pix_fmt yuv420p \
-  -c:v libx264 -profile:v main -g 24 -bf 0 -b:v 230k -maxrate 230k -bufsize 10k -x264-params slices=4 \
+  -c:v libx264 -threads 1 -profile:v main -g 24 -bf 0 -b:v 230k -maxrate 230k -bufsize 10k -x264-params slices=4 \
   -f h264 "$tmp/$name.h264"
 ffmpeg -y -loglevel error -r 25 -i "$tmp/$name.h264" -c copy -f mp4 "$tmp/$name.mp4"
 python3 "$data/mp4_extract.py" "$tmp/$name.mp4" "$out/$name" | awk '{ print "frame", $2, $3 }' >"$out/$name.nal.txt"

@@ -1,13 +1,15 @@
 // Frame dumping: four process-wide dump slots in the CAL handle.
 #include "core/dump.hpp"
 
+#include "core/handle.hpp"
 #include "core/sal.hpp"
 
 namespace vorcal::core {
 
 bool IsDumpOpen(const CALHandle *hCAL, uint32_t uSlot) noexcept
 {
-    return hCAL && uSlot < CAL_DUMP_SLOTS && hCAL->m_hDumpFile[uSlot] != 0;
+    // A handle that is no longer the live one has been freed: its slots are gone.
+    return hCAL && hCAL == LiveHandle() && uSlot < CAL_DUMP_SLOTS && hCAL->m_hDumpFile[uSlot] != 0;
 }
 
 void WriteDumpRecord(const CALHandle *hCAL, uint32_t uSlot, const uint8_t *pData, int32_t iLen) noexcept

@@ -10,7 +10,7 @@ namespace vorcal::core {
 inline constexpr uint32_t kVideoDumpSlot = 0;
 inline constexpr uint32_t kAudioDumpSlot = 1;
 
-// True when dump slot uSlot of the handle holds an open file.
+// True when hCAL is the live handle and its dump slot uSlot holds an open file.
 bool IsDumpOpen(const CALHandle *hCAL, uint32_t uSlot) noexcept;
 
 // Writes one record to an open slot. Nothing is written for a null payload with a non-zero

@@ -5,6 +5,7 @@
 #include <vorcal/core.h>
 #include <vorcal/wrapper.h>
 
+#include "core/handle.hpp"
 #include "core/sal.hpp"
 
 namespace {
@@ -16,6 +17,11 @@ constexpr uint32_t kMajorVersion = 1;
 constexpr uint32_t kMinorVersion = 1;
 
 } // namespace
+
+const CALHandle *vorcal::core::LiveHandle() noexcept
+{
+    return g_hCAL;
+}
 
 extern "C" CALHandle *vorCAL_GetHandle(uint32_t /*uReserved*/, uint32_t uMajor, uint32_t uMinor)
 {

@@ -17,9 +17,10 @@
 
 namespace {
 
-constexpr uint32_t kProperties[] = {3, 81, 82, 83, 84, 97, 101, 103, 160}; // every CAL_PROP_* the layer asks
+// every CAL_PROP_* the layer asks
+constexpr uint32_t kProperties[] = {3, 81, 82, 83, 84, 97, 101, 103, 160, CAL_PROP_TRUST_CONFIGURATION};
 constexpr uint32_t kOTIs[] = {CAL_OTI_H264, CAL_OTI_MPEG4_VISUAL, CAL_OTI_H263, CAL_OTI_WVC1};
-int64_t g_answers[161]; // by property number; -1: not answered
+int64_t g_answers[CAL_PROP_TRUST_CONFIGURATION + 1]; // by property number; -1: not answered
 int32_t g_initResult = 0;
 volatile uint8_t g_sink = 0;
 

@@ -66,8 +66,9 @@ TEST(AudioAdapt, FrameTypeLock)
 }
 
 // Frames of the locked type and length pass; any other (the length decides first) reaches the
-// codec as the silent frame. A later Init that locks frees the old frame first, also when the
-// new one cannot be allocated (no lock then); one that does not lock leaves the fields alone.
+// codec as the silent frame. A later Init that reaches the lock step frees the old frame first,
+// also when the new type is out of range or its frame cannot be allocated (no lock then); one
+// that does not reach it leaves the fields alone.
 TEST(AudioAdapt, SubstitutionAndLaterInit)
 {
     RecordingSal::Get().Reset();
@@ -96,11 +97,15 @@ TEST(AudioAdapt, SubstitutionAndLaterInit)
     uint8_t *pKept = codec->m_pSilenceFrame;
     EXPECT_EQ(codec->m_uSilenceFrameLen, 16u);
     EXPECT_EQ(RecordingSal::Get().liveBlocks.size(), 4u); // handle, entry, instance, one silent frame
-    Init(codec.get(), {0x44}); // out of range: the type is recorded, the frame stays
     RecordingCodec::Get().Answer(CAL_PROP_AMR_FRAME_TYPE_LOCK, 0);
     Init(codec.get(), {0x0C});
-    EXPECT_EQ(std::make_tuple(codec->m_pSilenceFrame, codec->m_uAMRFrameType), std::make_tuple(pKept, 8u));
+    EXPECT_EQ(std::make_tuple(codec->m_pSilenceFrame, codec->m_uAMRFrameType), std::make_tuple(pKept, 2u));
     RecordingCodec::Get().Answer(CAL_PROP_AMR_FRAME_TYPE_LOCK, 1);
+    Init(codec.get(), {0x44}); // out of range: the type is recorded and the earlier lock is off
+    EXPECT_EQ(std::make_tuple(codec->m_pSilenceFrame, codec->m_uSilenceFrameLen, codec->m_uAMRFrameType),
+              std::make_tuple(nullptr, 0u, 8u));
+    EXPECT_EQ(Decode(codec.get(), frames[2].data(), 1), std::make_pair(P(frames[2].data()), CALParam{1}));
+    Init(codec.get(), {0x14});
     RecordingSal::Get().FailAllocation(1);
     Init(codec.get(), {0x3C});
     EXPECT_EQ(codec->m_pSilenceFrame, nullptr);

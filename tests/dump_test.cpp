@@ -58,6 +58,26 @@ protected:
     CALCodec *hAudio = nullptr;
 };
 
+// An instance used after the last vorCAL_ReleaseHandle: the handle and its dump slots are gone,
+// so its wrappers write no record (and read no freed memory: ASan watches in the sanitizer run)
+// and otherwise work as before.
+TEST_F(DumpTest, InstancesOutlivingTheHandleSkipDumping)
+{
+    ASSERT_NE(vorCAL_DumpFrames(hCAL, Path("late_video.dump").c_str(), 0), 0u);
+    ASSERT_NE(vorCAL_DumpFrames(hCAL, Path("late_audio.dump").c_str(), 1), 0u);
+    vorCAL_ReleaseHandle(hCAL);
+    const size_t uWrites = RecordingSal::Get().writes.size();
+    const uint8_t frame[4] = {1, 2, 3, 4};
+    uint32_t word = 0;
+    EXPECT_EQ(vorCAL_AudioDecoderInit(hAudio, 0, frame, 4, frame, 4, nullptr, nullptr, nullptr, nullptr, 0), 0);
+    EXPECT_EQ(vorCAL_AudioDecoderDecode(hAudio, frame, 4, 0, 0, 0, 0), 0);
+    EXPECT_EQ(vorCAL_VideoDecoderInit(hVideo, 0x31564D57, frame, 4, nullptr, 0, 4, nullptr, nullptr, nullptr, 0), 0);
+    EXPECT_EQ(vorCAL_VideoDecoderDecode(hVideo, frame, 4, 0, 0, &word), 0);
+    EXPECT_EQ(RecordingSal::Get().writes.size(), uWrites);
+    EXPECT_EQ(RecordingCodec::Get().Count(3), 2u);
+    EXPECT_EQ(RecordingCodec::Get().Last(3)->data, std::vector<uint8_t>(frame, frame + 4));
+}
+
 TEST_F(DumpTest, VideoFramesAreLengthPrefixedRecords)
 {
     const std::string path = Path("video.dump");

@@ -50,6 +50,11 @@ Bytes MPEG4DSI(uint8_t uIndication, uint32_t uWidth = 352, uint32_t uHeight = 28
         .PutBit(1).Put(uWidth, 13).PutBit(1).Put(uHeight, 13).PutBit(1).Align().PutBytes({0x12, 0x34}).Bytes();
 }
 
+Bytes Fixture(const std::string &name)
+{
+    return RecordingSal::ReadFile(std::string(VORCAL_TEST_DATA_DIR) + "/h264/" + name);
+}
+
 // H.263 picture header with PLUSPTYPE (source format 7), UFEP 001 and QCIF.
 const Bytes kH263Extended = BitWriter().Put(0x20, 22).Put(0, 8).Put(2, 2).Put(0, 3).Put(7, 3).Put(1, 3).Put(2, 3)
                                 .Put(0, 25).Align().PutBytes({0x55, 0x55}).Bytes();
@@ -185,6 +190,11 @@ TEST_F(VideoAdaptTest, InitSizeAndRefusals)
         {H264, AnnexB({kSei, sps, kPps}), {{3, 1}, {84, 1}}, 640, 480, ""},
         {H264, AnnexB({sps, kPps}), {{3, kNo | 1}}, 0, 0, ""},
         {H264, AvcC(sps, kPps), {{3, 1}}, 0, 0, ""}, // the size is read from start-code framing only
+        // The stream-aware mode: the display size, also from a record (field-coded, cropped).
+        {H264, Fixture("interlaced_64x40.h264"), {{CAL_PROP_TRUST_CONFIGURATION, 1}, {3, 1}}, 64, 40, ""},
+        {H264, Fixture("interlaced_64x40.avcc"), {{CAL_PROP_TRUST_CONFIGURATION, 1}, {3, 1}}, 64, 40, ""},
+        // Any other answer: the documented parser, which reads High profile's fields as Baseline's.
+        {H264, Fixture("interlaced_64x40.h264"), {{CAL_PROP_TRUST_CONFIGURATION, 2}, {3, 1}}, 16, 80, ""},
         {H264, main, {{3, 1}, {84, 1}}, 320, 240, "H.264 Error(Profile[77], Level[30])!!! H.264 codec can't support profile[Main Profile]\n"},
         {H264, AnnexB({MakeSPS(100, 320, 240), kPps}), {{84, 1}}, 0, 0, ""},
         {H264, main, {{84, 0}}, 0, 0, ""},
@@ -363,6 +373,104 @@ TEST_F(VideoAdaptTest, H264SessionsOnRealClip)
     EXPECT_EQ(std::vector<uint32_t>({width, height, pitch}), std::vector<uint32_t>({320, 192, 320}));
     for (size_t i = 0; i < mp4.size(); ++i)
         EXPECT_EQ(Decode(annexB[i]) == 0 ? Received() : Bytes{}, Kept(mp4[i], false)) << i;
+}
+
+// The units of start-code framed data; zero bytes before a start code belong to it.
+std::vector<Bytes> Units(const Bytes &d)
+{
+    const Bytes code{0, 0, 1};
+    std::vector<Bytes> units;
+    for (auto p = std::search(d.begin(), d.end(), code.begin(), code.end()); p != d.end();) {
+        const auto q = std::search(p + 3, d.end(), code.begin(), code.end());
+        units.emplace_back(p + 3, q);
+        while (!units.back().empty() && units.back().back() == 0)
+            units.back().pop_back();
+        p = q;
+    }
+    return units;
+}
+
+// The stream-aware mode (property 0x1000 answered 1) on MP4 samples of which 18 of 24 begin
+// with a first length of 256-511 (00 00 01 xx). Knowing from the record that they carry 4-byte
+// lengths (the 2 passed to Init do not count), the layer gives a codec that wants start codes
+// and no parameter sets what ffmpeg's h264_mp4toannexb made of each sample, unit for unit, from
+// the first slice on, and the display size. Without the answer the documented format test takes
+// those 18 for start-code framing and they reach the codec unconverted.
+TEST_F(VideoAdaptTest, StreamAwareModeOnRealClip)
+{
+    const std::string clip = std::string(VORCAL_TEST_DATA_DIR) + "/h264/trust_160x96";
+    const Bytes avcC = RecordingSal::ReadFile(clip + ".avcc");
+    const std::vector<Bytes> mp4 = Samples(clip + ".nal"), annexB = Samples(clip + ".mp4toannexb.h264");
+    ASSERT_TRUE(mp4.size() == 24 && annexB.size() == 24) << clip;
+    for (const uint32_t uTrust : {1u, 0u, kNo | 1}) {
+        SCOPED_TRACE(uTrust);
+        Open(H264, {{CAL_PROP_TRUST_CONFIGURATION, uTrust}, {3, 1}, {82, 2}, {83, 0}, {81, 2}});
+        width = height = 0;
+        ASSERT_EQ(Init(H264, avcC, {}, uTrust == 1 ? 2 : 4), 0);
+        EXPECT_EQ(std::pair(width, height), uTrust == 1 ? std::pair(160u, 96u) : std::pair(0u, 0u));
+        size_t uUnconverted = 0, uDropped = 0;
+        for (size_t i = 0; i < mp4.size(); ++i) {
+            const int32_t iResult = Decode(mp4[i]);
+            uUnconverted += iResult == 0 && Received() == mp4[i];
+            uDropped += iResult == 1 && word == 4;
+            if (uTrust != 1)
+                continue;
+            const std::vector<Bytes> units = Units(annexB[i]);
+            const auto slice = std::find_if(units.begin(), units.end(), [](const Bytes &u) { return (u[0] & 0x1F) == 1 || (u[0] & 0x1F) == 5; });
+            ASSERT_EQ(iResult, 0) << i;
+            EXPECT_EQ(Units(Received()), std::vector<Bytes>(slice, units.end())) << i;
+        }
+        // Without the mode, three of the 18 are even dropped: their 00 00 01 xx reads as a start
+        // code and an SEI or parameter-set header, and nothing after it as a slice.
+        EXPECT_EQ(std::pair(uUnconverted, uDropped), uTrust == 1 ? std::pair(size_t{0}, size_t{0}) : std::pair(size_t{15}, size_t{3}));
+    }
+}
+
+// Conversions the documented destination (input + 100 bytes) cannot hold: the buffer grows to
+// the converted size plus the headroom and the frame arrives whole, and the next such frame
+// reuses it; a frame that fits exactly grows nothing. An allocation failure in the retry drops
+// the frame and leaves no buffer.
+TEST_F(VideoAdaptTest, BufferGrowsForFramesTheHeadroomCannotHold)
+{
+    const Bytes picture = Fixture("slices_208x192.h264");
+    const std::vector<Bytes> units = Units(picture), small(101, Bytes{0x41, 0x9A, 0x12}), hundred(small.begin(), small.end() - 1);
+    auto Framed = [](const std::vector<Bytes> &us, int iSize) { // iSize 3: start codes of 3 bytes, -4: of 4
+        Bytes out;
+        for (const Bytes &u : us)
+            out = Cat({out, iSize == 3 ? AnnexB({u}, 3) : iSize == -4 ? AnnexB({u}) : LengthPrefixed({u}, iSize)});
+        return out;
+    };
+    // The picture: SPS, PPS, SEI and 156 single-macroblock slices, all but two behind 3-byte codes.
+    ASSERT_EQ(units.size(), 159u);
+    const std::tuple<Bytes, uint32_t, uint32_t, Bytes> cases[] = {
+        {picture, 4, 1, Framed(units, 4)},                  // 157 bytes longer
+        {Framed(small, 3), 4, 1, Framed(small, 4)},         // 101 bytes longer
+        {Framed(small, 2), 2, 2, Framed(small, -4)},        // 202 bytes longer
+        {Framed(hundred, 3), 4, 1, Framed(hundred, 4)},     // 100 bytes longer: fits
+    };
+    for (const auto &[in, uNALSize, uWanted, out] : cases) {
+        SCOPED_TRACE(in.size());
+        Open(H264, {{81, uWanted}});
+        hCodec->m_uH264NALSize = uNALSize;
+        const size_t uAllocs = sal.allocSizes.size();
+        for (int k = 0; k < 2; ++k) {
+            ASSERT_EQ(Decode(in), 0);
+            EXPECT_EQ(Received(), out);
+        }
+        const uint32_t uIn = uint32_t(in.size()) + 100, uOut = uint32_t(out.size()) + 100;
+        const std::vector<uint32_t> grown{uIn, uOut}, kept{uIn};
+        EXPECT_EQ(std::vector<uint32_t>(sal.allocSizes.begin() + long(uAllocs), sal.allocSizes.end()),
+                  out.size() > in.size() + 100 ? grown : kept);
+        EXPECT_EQ(Traces(), Texts{});
+    }
+    Open(H264, {{81, 1}});
+    hCodec->m_uH264NALSize = 4;
+    sal.FailAllocation(2);
+    EXPECT_EQ(Decode(picture), 1);
+    EXPECT_EQ(std::tuple(word, codec.Count(3), hCodec->m_pIntermediateFrame), std::tuple(4u, size_t{0}, nullptr));
+    EXPECT_EQ(Traces(), Texts{});
+    ASSERT_EQ(Decode(picture), 0);
+    EXPECT_EQ(Received(), Framed(units, 4));
 }
 
 } // namespace

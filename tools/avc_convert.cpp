@@ -6,6 +6,7 @@
 #include <vorcal/video_tools.h>
 
 #include "core/sal.hpp"
+#include "tools/avc_convert.hpp"
 #include "tools/avc_nal.hpp"
 
 namespace vorcal::tools::avc {
@@ -37,9 +38,9 @@ void CopyPadded(uint8_t *pDst, const uint8_t *pSrc, int64_t iLen, int64_t iFrom,
 }
 
 // Length-prefixed units (size 1-4) to 4-byte start codes. Trailing bytes too few for another
-// length field are dropped.
-int32_t LengthToAnnexB(uint8_t *pDst, int64_t iDstSize, const uint8_t *pSrc, int32_t iSrcLen,
-                       int32_t iSize) noexcept
+// length field are dropped. kMeasure counts the bytes without writing or tracing (pDst unused).
+template <bool kMeasure>
+int64_t LengthToAnnexB(uint8_t *pDst, int64_t iDstSize, const uint8_t *pSrc, int32_t iSrcLen, int32_t iSize) noexcept
 {
     if (!ValidNalLengthSize(iSize))
         return -1;
@@ -53,26 +54,30 @@ int32_t LengthToAnnexB(uint8_t *pDst, int64_t iDstSize, const uint8_t *pSrc, int
         iPos += iSize;
         iRemaining -= iSize;
         if (uUnit > iRemaining) {
-            VORCAL_TRACE(kTraceH264Tools, 0, "[CAL_Tools %d] vorCALTools_AVC_ConvertFormat Error(%d, %d)\n",
-                         __LINE__, static_cast<int>(iRemaining), static_cast<int>(uUnit));
+            if constexpr (!kMeasure)
+                VORCAL_TRACE(kTraceH264Tools, 0, "[CAL_Tools %d] vorCALTools_AVC_ConvertFormat Error(%d, %d)\n",
+                             __LINE__, static_cast<int>(iRemaining), static_cast<int>(uUnit));
             return -1;
         }
-        if (iWritten + 4 + uUnit > iDstSize)
-            return -1;
-        memcpy(pDst + iWritten, kStartCode, 4);
-        memcpy(pDst + iWritten + 4, pSrc + iPos, uUnit);
+        if constexpr (!kMeasure) {
+            if (iWritten + 4 + uUnit > iDstSize)
+                return -1;
+            memcpy(pDst + iWritten, kStartCode, 4);
+            memcpy(pDst + iWritten + 4, pSrc + iPos, uUnit);
+        }
         iWritten += 4 + int64_t{uUnit};
         iPos += uUnit;
         iRemaining -= uUnit;
     } while (iRemaining > iSize);
-    return static_cast<int32_t>(iWritten);
+    return iWritten;
 }
 
 // Start codes to 4-byte length prefixes. Each unit runs to the next start code that
 // vorCALTools_AVC_FindStartCode finds after the current one; the search and the copy of the
-// unit are one pass. With bSlicesOnly only coded slices are written.
-int32_t AnnexBToLength(uint8_t *pDst, int64_t iDstSize, const uint8_t *pSrc, int32_t iSrcLen,
-                       bool bSlicesOnly) noexcept
+// unit are one pass. With bSlicesOnly only coded slices are written. kMeasure counts the bytes
+// without writing or tracing (pDst unused).
+template <bool kMeasure>
+int64_t AnnexBToLength(uint8_t *pDst, int64_t iDstSize, const uint8_t *pSrc, int32_t iSrcLen, bool bSlicesOnly) noexcept
 {
     const size_t uLen = iSrcLen > 0 ? static_cast<size_t>(iSrcLen) : 0;
     size_t uPos = 0;
@@ -86,40 +91,58 @@ int32_t AnnexBToLength(uint8_t *pDst, int64_t iDstSize, const uint8_t *pSrc, int
         if (bSlicesOnly && !IsSlice(ByteAt(pSrc, iSrcLen, static_cast<int64_t>(uBody)) & kTypeMask)) {
             const int64_t iNext = FindCode(pSrc, uBody + 1, uLen - 3, uLen);
             if (iNext < 0) {
-                VORCAL_TRACE_PLAIN("[vorCAL_Tools %d] No correct Frame.\n", __LINE__);
+                if constexpr (!kMeasure)
+                    VORCAL_TRACE_PLAIN("[vorCAL_Tools %d] No correct Frame.\n", __LINE__);
                 return -1;
             }
             uPos = static_cast<size_t>(iNext);
             continue;
         }
-        if (iWritten + 4 > iDstSize)
-            return -1;
-        uint8_t *pOut = pDst + iWritten + 4;
-        const size_t uRoom = static_cast<size_t>(iDstSize - iWritten - 4);
-        const size_t q = FindStartCodePrefixCopy(pSrc, uBody, uLen, pOut, uRoom);
+        size_t q = 0;
+        size_t uRoom = 0;
+        if constexpr (kMeasure) {
+            q = FindStartCodePrefix(pSrc, uBody, uLen);
+        } else {
+            if (iWritten + 4 > iDstSize)
+                return -1;
+            uRoom = static_cast<size_t>(iDstSize - iWritten - 4);
+            q = FindStartCodePrefixCopy(pSrc, uBody, uLen, pDst + iWritten + 4, uRoom);
+        }
         const int64_t iNext = ResolveCode(pSrc, uBody, uLen - 3, q, uLen);
         const size_t uUnitEnd = iNext < 0 ? uLen : static_cast<size_t>(iNext);
         const size_t uUnit = uUnitEnd - uBody;
-        if (uUnit > uRoom)
-            return -1;
-        if (uUnitEnd > q) // a prefix too close to the end to count belongs to the unit
-            memcpy(pOut + (q - uBody), pSrc + q, uUnitEnd - q);
-        PutBE32(pDst + iWritten, static_cast<uint32_t>(uUnit));
+        if constexpr (!kMeasure) {
+            if (uUnit > uRoom)
+                return -1;
+            if (uUnitEnd > q) // a prefix too close to the end to count belongs to the unit
+                memcpy(pDst + iWritten + 4 + (q - uBody), pSrc + q, uUnitEnd - q);
+            PutBE32(pDst + iWritten, static_cast<uint32_t>(uUnit));
+        }
         iWritten += 4 + static_cast<int64_t>(uUnit);
         uPos = uUnitEnd;
     } while (uPos < uLen);
-    return static_cast<int32_t>(iWritten);
+    return iWritten;
+}
+
+// The conversion from a source of the framing given; results fit 32 bits whenever they fit the
+// destination, and the measuring pass reports sizes beyond.
+template <bool kMeasure>
+int64_t Convert(uint8_t *pDst, int32_t iDstSize, const uint8_t *pSrc, int32_t iSrcLen, int32_t iSize,
+                int32_t iSourceFormat, bool bSlicesOnly) noexcept
+{
+    if (iSrcLen < iSize || pSrc == nullptr)
+        return -1;
+    const int64_t iRoom = (pDst != nullptr && iDstSize > 0) ? iDstSize : 0;
+    if (iSourceFormat == CAL_AVC_FORMAT_NAL)
+        return LengthToAnnexB<kMeasure>(pDst, iRoom, pSrc, iSrcLen, iSize);
+    return AnnexBToLength<kMeasure>(pDst, iRoom, pSrc, iSrcLen, bSlicesOnly);
 }
 
 int32_t ConvertFormat(uint8_t *pDst, int32_t iDstSize, const uint8_t *pSrc, int32_t iSrcLen,
                       int32_t iSize, bool bSlicesOnly) noexcept
 {
-    if (iSrcLen < iSize || pSrc == nullptr)
-        return -1;
-    const int64_t iRoom = (pDst != nullptr && iDstSize > 0) ? iDstSize : 0;
-    if (vorCALTools_AVC_CheckFormat(pSrc, iSrcLen) == CAL_AVC_FORMAT_NAL)
-        return LengthToAnnexB(pDst, iRoom, pSrc, iSrcLen, iSize);
-    return AnnexBToLength(pDst, iRoom, pSrc, iSrcLen, bSlicesOnly);
+    return static_cast<int32_t>(Convert<false>(pDst, iDstSize, pSrc, iSrcLen, iSize,
+                                               vorCALTools_AVC_CheckFormat(pSrc, iSrcLen), bSlicesOnly));
 }
 
 // Container to start codes: copies one entry (16-bit length, unit) as 00 00 00 01 and the
@@ -296,6 +319,18 @@ const uint8_t *AnnexBConfigStream(const uint8_t *pData, int32_t iLen, int32_t *p
 }
 
 } // namespace
+
+int32_t ConvertFrame(uint8_t *pDst, int32_t iDstSize, const uint8_t *pSrc, int32_t iSrcLen, int32_t iNALLengthSize,
+                     int32_t iSourceFormat) noexcept
+{
+    return static_cast<int32_t>(Convert<false>(pDst, iDstSize, pSrc, iSrcLen, iNALLengthSize, iSourceFormat, false));
+}
+
+int64_t ConvertedSize(const uint8_t *pSrc, int32_t iSrcLen, int32_t iNALLengthSize, int32_t iSourceFormat) noexcept
+{
+    return Convert<true>(nullptr, 0, pSrc, iSrcLen, iNALLengthSize, iSourceFormat, false);
+}
+
 } // namespace vorcal::tools::avc
 
 namespace avc = vorcal::tools::avc;

@@ -128,4 +128,16 @@ inline int32_t NextNal(const uint8_t *pBuf, int32_t iLen, int32_t iPos, int32_t 
     return iNext < iLen ? static_cast<int32_t>(iNext) : -1;
 }
 
+// lengthSizeMinusOne + 1 of an AVC decoder configuration record (ISO/IEC 14496-15 5.3.3.1:
+// configurationVersion 1, lengthSizeMinusOne in the low two bits of byte 4), or 0 when the data
+// is not one. A parameter-set list (count, 16-bit length, SPS) may begin with 1 as well; its
+// byte 3 is then the SPS header, which no level_idc equals.
+inline int32_t ConfigRecordNalLengthSize(const uint8_t *p, int32_t iLen) noexcept
+{
+    constexpr int32_t kFixedPart = 7; // up to the first SPS length
+    if (p == nullptr || iLen < kFixedPart || p[0] != 1 || (p[3] & (kForbiddenBit | kTypeMask)) == kNalSps)
+        return 0;
+    return (p[4] & 3) + 1;
+}
+
 } // namespace vorcal::tools::avc

@@ -54,13 +54,13 @@ void LockAMRFrameType(CALCodec *hCodec, const uint8_t *pFrame, uint32_t uFrameLe
     const uint32_t uFT = FrameTypeOf(pFrame);
     hCodec->m_uAMRFrameType = uFT;
     const bool bNarrow = uOTI == CAL_OTI_AMR_NB;
+    // A new lock, or none, replaces the lock of an earlier Init.
+    DropSilenceFrame(hCodec);
     if (uFT > (bNarrow ? kAmrNbMaxFT : kAmrWbMaxFT)) {
-        // No lock: a silent frame of an earlier Init stays where it is.
         VORCAL_TRACE(kTraceError, 0, "[vorCAL_Wrapper, %d] AMR %s FT = [%d]\n", __LINE__, bNarrow ? "NB" : "WB",
                      static_cast<int>(uFT));
         return;
     }
-    DropSilenceFrame(hCodec);
     if (bNarrow) {
         VORCAL_TRACE(kTraceAudio, 0, "[vorCAL_Wrapper, %d] AMR NB FT = [%d]\n", __LINE__, static_cast<int>(uFT));
         AMRNB_MuteFrame(&hCodec->m_pSilenceFrame, &hCodec->m_uSilenceFrameLen, uFT);

@@ -11,6 +11,8 @@
 #include <vorcal/video_tools.h>
 
 #include "core/sal.hpp"
+#include "tools/avc_convert.hpp"
+#include "tools/avc_nal.hpp"
 #include "wrapper/codec_slots.hpp"
 
 namespace vorcal::wrapper {
@@ -69,6 +71,33 @@ bool ReserveIntermediate(CALCodec *hCodec, int32_t iLen) noexcept
     return hCodec->m_pIntermediateFrame != nullptr;
 }
 
+// The stream-aware mode (CAL_PROP_TRUST_CONFIGURATION answered 1) takes the frame framing from
+// the configuration. An H.264 instance never has an AMR frame type (the lock runs for AMR OTIs
+// only), so the mode keeps the framing in m_uAMRFrameType and the instance record stays as
+// documented. 0 leaves the framing to the format test of each frame.
+struct ConfigFraming {
+    int32_t iFormat = 0;
+    uint32_t uNALSize = 0;
+};
+
+ConfigFraming FramingOfConfiguration(const VideoInitArgs &args) noexcept
+{
+    constexpr int32_t kMinConfigLen = 4; // what the format test needs
+    if (!Readable(args.pConfig, args.iConfigLen) || args.iConfigLen < kMinConfigLen)
+        return {};
+    if (vorCALTools_AVC_CheckFormat(args.pConfig, args.iConfigLen) == CAL_AVC_FORMAT_ANNEXB)
+        return {CAL_AVC_FORMAT_ANNEXB, args.uNALLengthSize};
+    // A configuration record tells its own length size; a parameter-set list does not.
+    const int32_t iRecordSize = tools::avc::ConfigRecordNalLengthSize(args.pConfig, args.iConfigLen);
+    return {CAL_AVC_FORMAT_NAL, iRecordSize ? static_cast<uint32_t>(iRecordSize) : args.uNALLengthSize};
+}
+
+inline int32_t TrustedFraming(const CALCodec *hCodec) noexcept
+{
+    const uint32_t uFormat = hCodec->m_uAMRFrameType;
+    return IsAVCFormat(uFormat) ? static_cast<int32_t>(uFormat) : 0;
+}
+
 // The answer the layer gives itself instead of calling the codec.
 inline VideoInitPlan Answer(int32_t iResult) noexcept
 {
@@ -107,8 +136,24 @@ VideoInitPlan PrepareH264Init(CALCodec *hCodec, VideoInitArgs &args) noexcept
         return bParsedOK;
     };
 
-    if (VideoPropertyIs(hCodec, CAL_PROP_STREAM_PARAMETERS, 1) && ParseSPS())
-        StoreSize(args, sps.uWidth, sps.uHeight);
+    const bool bTrusted = VideoPropertyIs(hCodec, CAL_PROP_TRUST_CONFIGURATION, 1);
+    ConfigFraming framing;
+    if (hCodec->m_uCodecObjectTypeIndication == CAL_OTI_H264) { // the instance Decode adapts as H.264
+        if (bTrusted)
+            framing = FramingOfConfiguration(args);
+        hCodec->m_uAMRFrameType = static_cast<uint32_t>(framing.iFormat);
+        if (framing.iFormat == CAL_AVC_FORMAT_NAL)
+            hCodec->m_uH264NALSize = framing.uNALSize;
+    }
+
+    if (VideoPropertyIs(hCodec, CAL_PROP_STREAM_PARAMETERS, 1)) {
+        CALAVCSPS full;
+        if (!bTrusted && ParseSPS())
+            StoreSize(args, sps.uWidth, sps.uHeight);
+        else if (bTrusted && Readable(args.pConfig, args.iConfigLen) &&
+                 vorCALTools_AVC_ParseSPS(args.pConfig, args.iConfigLen, &full) == CAL_AVC_SPS_OK)
+            StoreSize(args, full.uWidth, full.uHeight); // the display size, from any configuration
+    }
 
     if (VideoPropertyIs(hCodec, CAL_PROP_H264_NO_MAIN_PROFILE, 1) && ParseSPS() && sps.uProfile == kProfileMain) {
         VORCAL_TRACE(kTraceError, 0,
@@ -121,7 +166,8 @@ VideoInitPlan PrepareH264Init(CALCodec *hCodec, VideoInitArgs &args) noexcept
     uint32_t uWanted = 0;
     if (!VideoPropertyAnswered(hCodec, CAL_PROP_H264_CONFIG_FORMAT, &uWanted))
         return {};
-    hCodec->m_uH264NALSize = args.uNALLengthSize;
+    if (framing.iFormat != CAL_AVC_FORMAT_NAL) // a record's own length size stays
+        hCodec->m_uH264NALSize = args.uNALLengthSize;
     if (!IsAVCFormat(uWanted))
         return {};
 
@@ -213,17 +259,46 @@ inline bool Drop(uint32_t *puDecodeResult, int32_t *piResult) noexcept
     return false;
 }
 
+// Converts the frame into the intermediate buffer, which holds at least frame.iLen bytes; the
+// converter is told the documented size, the frame length plus the headroom. Where that cannot
+// hold the converted frame (more than 100 units behind 3-byte start codes, or many units behind
+// short length fields), the buffer grows to the converted size plus the headroom and the frame
+// is converted again: no valid frame is dropped for want of room. kNoRoom when that memory is
+// not to be had.
+constexpr int32_t kNoRoom = -2;
+
+int32_t ConvertIntoIntermediate(CALCodec *hCodec, const VideoFrame &frame, int32_t iNALSize, int32_t iFormat) noexcept
+{
+    const int32_t iNewLen = tools::avc::ConvertFrame(hCodec->m_pIntermediateFrame, frame.iLen + kIntermediateHeadroom,
+                                                     frame.pData, frame.iLen, iNALSize, iFormat);
+    if (iNewLen != -1)
+        return iNewLen;
+    const int64_t iNeeded = tools::avc::ConvertedSize(frame.pData, frame.iLen, iNALSize, iFormat);
+    if (iNeeded <= int64_t{frame.iLen} + kIntermediateHeadroom || iNeeded > kMaxIntermediatePayload)
+        return -1; // not a matter of room: the frame itself is broken
+    if (!ReserveIntermediate(hCodec, static_cast<int32_t>(iNeeded)))
+        return kNoRoom;
+    return tools::avc::ConvertFrame(hCodec->m_pIntermediateFrame, hCodec->m_iIntermediateFrameSize + kIntermediateHeadroom,
+                                    frame.pData, frame.iLen, iNALSize, iFormat);
+}
+
 bool AdaptH264Frame(CALCodec *hCodec, VideoFrame &frame, CALParam uParam3, uint32_t *puDecodeResult,
                     int32_t *piResult) noexcept
 {
     const int32_t iNALSize = static_cast<int32_t>(hCodec->m_uH264NALSize);
+    // The framing of the frame: from the configuration in the stream-aware mode, else from its
+    // first bytes. The format test takes a 4-byte length of 0x100 to 0x1FF (00 00 01 xx) for a
+    // start code, so such a length-prefixed frame is searched, and later converted, as start-code
+    // framed unless the configuration said otherwise.
+    const int32_t iTrusted = TrustedFraming(hCodec);
+    auto FramingOf = [iTrusted](const VideoFrame &f) noexcept {
+        return iTrusted ? iTrusted : vorCALTools_AVC_CheckFormat(f.pData, f.iLen);
+    };
 
-    // In-band parameter sets: cut the SEI/SPS/PPS run and everything in front of it. The format
-    // test takes a 4-byte length of 0x100 to 0x1FF (00 00 01 xx) for a start code, so such a
-    // length-prefixed frame is searched, and later converted, as start-code framed.
+    // In-band parameter sets: cut the SEI/SPS/PPS run and everything in front of it.
     uint32_t uValue = 0;
     if (VideoPropertyAnswered(hCodec, CAL_PROP_H264_INBAND_PARAM_SETS, &uValue) && uValue == 0) {
-        const bool bAnnexB = vorCALTools_AVC_CheckFormat(frame.pData, frame.iLen) == CAL_AVC_FORMAT_ANNEXB;
+        const bool bAnnexB = FramingOf(frame) == CAL_AVC_FORMAT_ANNEXB;
         int32_t iRunLen = 0;
         const uint8_t *pRun = bAnnexB ? vorCALTools_AVC_ANNEXB_GetConfigStream(frame.pData, frame.iLen, &iRunLen)
                                       : vorCALTools_AVC_NAL_GetConfigStream(frame.pData, frame.iLen, iNALSize, &iRunLen);
@@ -242,13 +317,13 @@ bool AdaptH264Frame(CALCodec *hCodec, VideoFrame &frame, CALParam uParam3, uint3
 
     // Framing: rewrite into the intermediate buffer when the codec wants the other one.
     uint32_t uWanted = 0;
-    if (VideoPropertyAnswered(hCodec, CAL_PROP_H264_FRAME_FORMAT, &uWanted) && IsAVCFormat(uWanted) &&
-        vorCALTools_AVC_CheckFormat(frame.pData, frame.iLen) != static_cast<int32_t>(uWanted)) {
+    if (VideoPropertyAnswered(hCodec, CAL_PROP_H264_FRAME_FORMAT, &uWanted) && IsAVCFormat(uWanted)) {
+        const int32_t iFormat = FramingOf(frame);
+        if (iFormat == static_cast<int32_t>(uWanted))
+            return true;
         if (!ReserveIntermediate(hCodec, frame.iLen))
             return Drop(puDecodeResult, piResult);
-        const int32_t iNewLen = vorCALTools_AVC_ConvertFormat(hCodec->m_pIntermediateFrame,
-                                                              frame.iLen + kIntermediateHeadroom, frame.pData,
-                                                              frame.iLen, iNALSize);
+        const int32_t iNewLen = ConvertIntoIntermediate(hCodec, frame, iNALSize, iFormat);
         if (iNewLen == -1)
             VORCAL_TRACE(kTraceError, 0, "[CAL_Wrapper %d] vorCALTools_AVC_ConvertFormat failed[%d],iLen[%d]\n",
                          __LINE__, static_cast<int>(uParam3), frame.iLen);

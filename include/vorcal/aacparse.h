@@ -313,7 +313,9 @@ VORCAL_API int32_t VrAACDecInitOnlyParsing(VrAACDecoder_OnlyParsing *pDec, const
                                            uint32_t *puSampleRate, uint32_t *puChannels,
                                            uint32_t *puFrameSamples, uint32_t *puSBR,
                                            uint32_t *puBitsAligned, uint32_t *puHeaderBits);
-/* One ADTS header at the reader's position: 0, or -1 without a sync word (after one retry). */
+/* One ADTS header at the reader's position: 0, or -1 without a sync word (after one retry).
+ * The reader checks no end: from the byte it stands on (after aligning) 10 bytes must be
+ * readable, 11 when the sync word is found one byte on, one more each with a CRC. */
 VORCAL_API int32_t get_adts_headerOnlyParsing(VrAACDecoder_OnlyParsing *pDec);
 /* adif_header and its program config elements: 1 when one with the selected tag was read, else -1. */
 VORCAL_API int32_t VrGet_ADIF_Header_OnlyParsing(VrAACDecoder_OnlyParsing *pDec);

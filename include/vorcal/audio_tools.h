@@ -16,14 +16,17 @@ extern "C" {
 #endif
 
 /* Reads rate, channel configuration and the SBR object type (5) from the first two bytes of an
- * AudioSpecificConfig. Sampling-frequency indices 12-15 report 0 Hz. Returns 0. */
+ * AudioSpecificConfig; takes no length, so pDSI must hold 2 readable bytes. Sampling-frequency
+ * indices 12-15 report 0 Hz. Returns 0. */
 VORCAL_API int32_t vorCALTools_AAC_ParseDSI(const uint8_t *pDSI, uint32_t *puSamplingRate,
                                             uint32_t *puChannels, uint32_t *puSBR);
 /* 7: the size of an ADTS header without CRC. */
 VORCAL_API int32_t vorCALTools_Get_ADTS_HeaderSize(void);
-/* Writes a 7-byte ADTS header (profile 1, buffer fullness 0x7FF) for uFrameLen raw bytes. */
+/* Writes a 7-byte ADTS header (profile 1, buffer fullness 0x7FF) for uFrameLen raw bytes. Reads
+ * 2 bytes of pDSI and writes 7 bytes to pHeader; neither size is passed. */
 VORCAL_API int32_t vorCALTools_Make_ADTS_Header(const uint8_t *pDSI, int32_t uFrameLen, uint8_t *pHeader);
-/* The 13-bit frame_length field of an ADTS header (reads bytes 3-5). */
+/* The 13-bit frame_length field of an ADTS header: reads bytes 3-5, so pHeader must hold 6
+ * readable bytes. */
 VORCAL_API uint32_t _GetAACFrameLength(const uint8_t *pHeader);
 /* 7 or 9 (header size) when the buffer is exactly one ADTS frame, else 0. Length comes first. */
 VORCAL_API int32_t vorCALTools_AAC_isADTSAAC(int32_t uLen, const uint8_t *pBuf);

@@ -50,7 +50,7 @@ VORCAL_API int32_t _AlignBits(CALToolsBS *pBS);
 /* Loads n bytes, bit position unchanged; 1 when a load reached the end, 0 for n <= 0. */
 VORCAL_API int32_t _ShiftBytes(CALToolsBS *pBS, int32_t n);
 
-/* Big-endian fields. */
+/* Big-endian fields; they take no length and read 2, 3 and 4 bytes at p. */
 VORCAL_API uint32_t vorCALTools_ReadBigEndianValue16(const uint8_t *p);
 VORCAL_API uint32_t vorCALTools_ReadBigEndianValue24(const uint8_t *p);
 VORCAL_API uint32_t vorCALTools_ReadBigEndianValue32(const uint8_t *p);
@@ -110,8 +110,40 @@ typedef struct CALSPSInfo {
  * 2 forbidden_zero_bit set, 3 no SPS or pic_order_cnt_type above 2. */
 VORCAL_API uint32_t vorCALTools_AVC_GetSPSInfo(const uint8_t *pData, int32_t iLen, CALSPSInfo *pInfo);
 
+/* The whole sequence parameter set (ITU-T H.264 7.3.2.1.1 and the VUI of Annex E), filled by
+ * vorCALTools_AVC_ParseSPS. Sizes are in luma samples. */
+typedef struct CALAVCSPS {
+    uint32_t uProfileIdc, uConstraintFlags /* the constraint_set flags byte as coded */, uLevelIdc, uSPSId;
+    uint32_t uChromaFormatIdc, uSeparateColourPlane, uBitDepthLuma, uBitDepthChroma, uScalingMatrixPresent;
+    uint32_t uLog2MaxFrameNum, uPicOrderCntType, uMaxNumRefFrames, uFrameMbsOnly, uMbAdaptiveFrameField;
+    uint32_t uCodedWidth, uCodedHeight;                      /* pixels: macroblocks x 16, the whole frame */
+    uint32_t uCropLeft, uCropRight, uCropTop, uCropBottom;   /* pixels, CropUnitX/CropUnitY applied */
+    uint32_t uWidth, uHeight;                                /* display size: coded size minus cropping */
+    uint32_t uSarNum, uSarDen;                               /* sample aspect ratio; 0 and 0 when not signalled */
+    uint32_t uVideoFullRange, uColourPrimaries, uTransferCharacteristics, uMatrixCoefficients; /* 0 and 2, 2, 2 when absent */
+    uint32_t uNumUnitsInTick, uTimeScale, uFixedFrameRate;  /* 0 when absent */
+    uint32_t uMaxNumReorderFrames, uMaxDecFrameBuffering;   /* from bitstream_restriction; 0 when absent */
+} CALAVCSPS;
+
+/* Results of vorCALTools_AVC_ParseSPS. */
+#define CAL_AVC_SPS_OK              0
+#define CAL_AVC_SPS_ERR_ARGUMENT  (-1) /* null data or record, or a length of 0 or less */
+#define CAL_AVC_SPS_ERR_NOT_FOUND (-2) /* no SPS NAL unit in the data */
+#define CAL_AVC_SPS_ERR_MALFORMED (-3) /* a field outside its range in ITU-T H.264 7.4.2.1.1 or E.2.1 */
+#define CAL_AVC_SPS_ERR_TRUNCATED (-4) /* the data ends inside the SPS syntax */
+
+/* Finds the first SPS in one SPS NAL unit (header byte first), in start-code framed data (the
+ * first unit of type 7 after any 00 00 01) or in an AVC decoder configuration record
+ * (ISO/IEC 14496-15, first byte 1), and parses all of it: profile-dependent fields, scaling
+ * lists, every pic_order_cnt_type, cropping in chroma and field units, the VUI with Table E-1
+ * aspect ratios, HRD parameters and bitstream_restriction. Emulation-prevention bytes are
+ * removed; no byte outside [pData, pData + iLen) is read. Returns CAL_AVC_SPS_OK with *pSPS
+ * filled, or a negative CAL_AVC_SPS_ERR_* with *pSPS cleared (when pSPS is not null). */
+VORCAL_API int32_t vorCALTools_AVC_ParseSPS(const uint8_t *pData, int32_t iLen, CALAVCSPS *pSPS);
+
 /* Frame classification. uExtra: the NAL length size for H.264, a pointer to the 4-byte
- * sequence header for WMV3 and WVC1. */
+ * sequence header for WMV3 and WVC1 (4 readable bytes: its fourth is read, no length is
+ * passed). */
 VORCAL_API int32_t vorCALTools_IsIDRFrame(uint32_t uOTI, const uint8_t *pFrame, int32_t iFrameLen,
                                           CALParam uExtra);
 /* 1 for an MPEG-4 Visual B-VOP. */

@@ -21,7 +21,9 @@ extern "C" {
 typedef struct CALCodec {
     CALCodecFunc m_Functions[CAL_CODEC_FUNCTION_SLOTS]; /* copy of the registered table */
     CALParam m_uUserData;                 /* the codec's context, last argument of its slots */
-    uint32_t m_uAMRFrameType;             /* frame type of the first AMR frame */
+    uint32_t m_uAMRFrameType;             /* frame type of the first AMR frame; an H.264 instance in
+                                           * the stream-aware mode keeps here the frame framing taken
+                                           * from its configuration (CAL_AVC_FORMAT_*), else 0 */
     uint32_t m_uCodecObjectTypeIndication;
     uint8_t *m_pSilenceFrame;             /* cached silence frame, owned by the instance */
     uint32_t m_uSilenceFrameLen;
@@ -140,6 +142,13 @@ typedef struct CALVideoEncoderFunctions {
 #define CAL_PROP_AMR_FRAME_TYPE_LOCK      113u /* 1: lock the AMR frame type of the first frame */
 #define CAL_PROP_AAC_SILENCE_FRAMES       114u /* 0: the codec takes no AAC silence frames */
 #define CAL_PROP_H263_NO_EXTENDED_PTYPE   160u /* 1: refuse H.263 with extended picture type */
+/* Asked at H.264 Init. 1 turns on the stream-aware mode: the frame framing and NAL length size
+ * come from the Init configuration (an AVC decoder configuration record: length-prefixed frames
+ * with its lengthSizeMinusOne + 1; start-code framing: start-code frames) instead of the format
+ * test of each frame, for the parameter-set removal and the framing conversion alike; the picture
+ * size of property 3 is the display size of vorCALTools_AVC_ParseSPS (also from a record).
+ * A configuration shorter than 4 bytes leaves the framing to the format test. */
+#define CAL_PROP_TRUST_CONFIGURATION      0x1000u
 
 /* Codec object type indications the library branches on. */
 #define CAL_OTI_MPEG4_VISUAL   0x20u

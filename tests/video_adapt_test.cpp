@@ -235,7 +235,7 @@ TEST_F(VideoAdaptTest, DecodeAdaptsFrames)
     const Bytes au = AnnexB({kSps, kPps, kIDR}), vol = {0, 0, 1, 0xB0, 0x01, 0, 0, 1, 0xB6, 0x10, 0x20}, both = Cat({vol, au});
     const std::tuple<uint32_t, uint32_t, Answers, Bytes, Bytes, Texts> cases[] = {
         {H264, 4, {{83, 0}}, au, AnnexB({kIDR}), {kB}},
-        {H264, 4, {{83, 0}}, AnnexB({kSei, kSps, kPps, kIDR}, {3}), AnnexB({kIDR}, {3}), {kB}},
+        {H264, 4, {{83, 0}}, AnnexB({kSei, kSps, kPps, kIDR}, 3), AnnexB({kIDR}, 3), {kB}},
         {H264, 4, {{83, 0}}, AnnexB({kAUD, kSps, kPps, kIDR}), AnnexB({kIDR}), {kB}}, // dropped with the run
         {H264, 4, {{83, 0}}, AnnexB({kSps, kPps}), {}, {kB, "16/0 [CAL_Wrapper #] InValid Frame Len (0)\n"}},
         {H264, 4, {{83, 0}}, LengthPrefixed({kSei, kSps, kPps, kIDR, kSlice}, 4), LengthPrefixed({kIDR, kSlice}, 4), {kN}},
@@ -245,7 +245,7 @@ TEST_F(VideoAdaptTest, DecodeAdaptsFrames)
         {H264, 4, {{83, kNo}}, au, au, {}},
         {H264, 2, {{81, 1}}, au, LengthPrefixed({kSps, kPps, kIDR}, 4), {}},
         {H264, 2, {{81, 2}}, LengthPrefixed({kSps, kIDR}, 2), AnnexB({kSps, kIDR}), {}},
-        {H264, 4, {{81, 2}}, AnnexB({kIDR}, {3}), AnnexB({kIDR}, {3}), {}},
+        {H264, 4, {{81, 2}}, AnnexB({kIDR}, 3), AnnexB({kIDR}, 3), {}},
         {H264, 4, {{81, 3}}, LengthPrefixed({kIDR}, 4), LengthPrefixed({kIDR}, 4), {}},
         {H264, 4, {{81, kNo | 1}}, au, au, {}},
         {H264, 3, {{83, 0}, {81, 2}}, LengthPrefixed({kSps, kPps, kIDR}, 3), AnnexB({kIDR}), {kN}},

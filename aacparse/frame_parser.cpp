@@ -125,10 +125,11 @@ void SbrPayload(void *pContext, VrAACDecoder_OnlyParsing &dec, uint32_t uCount)
     bits::Advance(reader, uBitPos);
     bool bTables = false;
     const int32_t iResult = sbr::ExtensionData(&reader, &p.sbr, w.uLastChannel, bTables);
-    if (p.sbr.uHeaderCount > 0 && bTables)
+    // Without a header in force the SBR data cannot be read, so nothing in it counts.
+    if (p.sbr.uHeaderCount > 0 && bTables) {
         w.bSbr = true;
-    if (iResult == 2)
-        w.bPs = true;
+        w.bPs = w.bPs || iResult == 2;
+    }
 }
 
 // One raw_data_block() up to and including the byte alignment after its ID_END.

@@ -455,8 +455,9 @@ VORCAL_API uint32_t pred_max_bandsOnlyParsing(VrAACDecoder_OnlyParsing *pDec);
  * hhDecoder), so parsers on different threads never meet. Each parser is allocated once
  * through the system layer and a parse allocates nothing. The frame is read through a padded
  * copy: no byte outside the caller's frame is touched. SBR payloads in fill elements go to the
- * SBR parser with the parser's own SBR state (headers persist across frames); the fill
- * element's count decides where the walk resumes.
+ * SBR parser with the parser's own SBR state (headers persist across frames); what it finds
+ * counts while a valid SBR header is in force. The fill element's count decides where the walk
+ * resumes.
  * ---------------------------------------------------------------------------------------- */
 
 typedef struct CALAACParser CALAACParser; /* opaque: one decoder state record and a padded frame buffer */

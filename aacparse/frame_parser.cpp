@@ -132,7 +132,9 @@ void SbrPayload(void *pContext, VrAACDecoder_OnlyParsing &dec, uint32_t uCount)
     }
 }
 
-// One raw_data_block() up to and including the byte alignment after its ID_END.
+// One raw_data_block() up to and including the byte alignment after its ID_END. The state is
+// this parser's own and nobody reads its values, so the channel streams are walked without
+// storing spectral lines or generating noise.
 Result RawDataBlock(Walk &w)
 {
     VrAACDecoder_OnlyParsing &dec = w.p.dec;
@@ -150,15 +152,15 @@ Result RawDataBlock(Walk &w)
         uint32_t uTag = 0, uCount = 0;
         switch (uId) {
         case kIdSCE:
-            bOk = SingleChannelElement(dec, dec.MCInfo) == 0;
+            bOk = SingleChannelElement(dec, dec.MCInfo, false) == 0;
             w.uLastChannel = uId;
             break;
         case kIdCPE:
-            bOk = ChannelPairElement(dec, dec.MCInfo) == 0;
+            bOk = ChannelPairElement(dec, dec.MCInfo, false) == 0;
             w.uLastChannel = uId;
             break;
         case kIdLFE:
-            bOk = LfeChannelElement(dec, dec.MCInfo) == 1;
+            bOk = LfeChannelElement(dec, dec.MCInfo, false) == 1;
             w.uLastChannel = uId;
             break;
         case kIdCCE:

@@ -94,6 +94,30 @@ constexpr SpectralHit FindSpectral(const SpectralLevels &t, uint32_t uBook, uint
     return {&t.book[uBook][k][t.size[uBook][k] + v], 6 + k};
 }
 
+// The same search on one codebook's row of the tables, fetched once for a run of codewords.
+struct SpectralRow {
+    const VrSpectralEntry_OnlyParsing *const *book;
+    const uint8_t *size;
+    const uint16_t *max;
+    const uint8_t *length0;
+};
+inline SpectralRow RowOf(uint32_t uBook) noexcept
+{
+    return {bookOnlyParsing[uBook], CBsizeOnlyParsing[uBook], MaxValOnlyParsing[uBook], kSpectralLength0[uBook].data()};
+}
+inline SpectralHit FindSpectral(const SpectralRow &r, uint32_t uPeek16) noexcept
+{
+    int32_t v = static_cast<int32_t>(uPeek16 >> 10) - r.max[0];
+    if (v <= 0) {
+        const int32_t i = r.size[0] + v;
+        return {&r.book[0][i], r.length0[i]};
+    }
+    uint32_t k = 1;
+    while ((v = static_cast<int32_t>(uPeek16 >> (10 - k)) - r.max[k]) > 0)
+        ++k;
+    return {&r.book[k][r.size[k] + v], 6 + k};
+}
+
 struct ScalefactorHit {
     uint32_t uIndex; // 0-120, 60 for a difference of 0
     uint32_t uLength;

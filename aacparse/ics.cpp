@@ -11,8 +11,9 @@
 namespace vorcal::aacparse {
 namespace {
 
-using bits::Get;
 using bits::Get1;
+// Every field read here but the escape's N + 4 bits is 1 to 9 bits wide.
+inline uint32_t Get(VrBitReader_OnlyParsing &b, uint32_t n) { return bits::GetShort(b, n); }
 
 constexpr uint32_t kEightShort = VR_EIGHT_SHORT_SEQUENCE_OnlyParsing;
 constexpr uint32_t kMaxBands = VR_AAC_MAX_BANDS_OnlyParsing;
@@ -65,32 +66,98 @@ bool WalkSections(const VrICS_OnlyParsing &ics, const VrICS_OnlyParsing &wics, u
 
 int32_t ScalefactorDiff(VrBitReader_OnlyParsing &b)
 {
-    const huffman::ScalefactorHit hit = huffman::FindScalefactor(huffman::kScalefactor, bits::Show(b, 19));
+    const uint32_t uPeek = bits::ShowShort(b, 19);
+    // Level 0 directly (most differences have codes of up to 6 bits), else the level search.
+    const int32_t v = static_cast<int32_t>(uPeek >> 13) - static_cast<int32_t>(MaxVal_sclOnlyParsing[0]);
+    const huffman::ScalefactorHit hit =
+        v <= 0 ? huffman::ScalefactorHit{bookscl0OnlyParsing[static_cast<int32_t>(CBsize_sclOnlyParsing[0]) + v],
+                                         huffman::kScalefactorLength0[static_cast<uint32_t>(static_cast<int32_t>(CBsize_sclOnlyParsing[0]) + v)]}
+               : huffman::FindScalefactor(huffman::kScalefactor, uPeek);
     bits::Advance(b, hit.uLength);
     return static_cast<int32_t>(hit.uIndex) - 60;
 }
 
-// Codewords of codebook uBook (1-11) for uCount lines: quadruples for codebooks 1-4, pairs for
-// 5-11; a sign bit per nonzero value in the unsigned books; escapes in codebook 11.
-void DecodeLines(VrAACDecoder_OnlyParsing &dec, uint32_t uBook, int16_t *piOut, uint32_t uCount)
+// The escape sequence of a value of +-16 on a local reader (see Escape).
+int32_t EscapeOn(VrBitReader_OnlyParsing &b, int32_t iValue)
 {
-    VrBitReader_OnlyParsing &b = dec.Bits;
-    const uint32_t uDim = uBook <= 4 ? 4 : 2;
-    const bool bSigned = uBook == 1 || uBook == 2 || uBook == 5 || uBook == 6;
-    for (uint32_t j = 0; j + uDim <= uCount; j += uDim) {
-        const huffman::SpectralHit hit = huffman::FindSpectral(huffman::kSpectral, uBook, bits::Show(b, 16));
-        bits::Advance(b, hit.uLength);
-        int32_t v[4] = {hit.pEntry->iValue[0], hit.pEntry->iValue[1], hit.pEntry->iValue[2], hit.pEntry->iValue[3]};
-        if (!bSigned)
-            for (uint32_t d = 0; d < uDim; ++d)
-                if (v[d] != 0 && Get1(b))
+    uint32_t n = 0;
+    while (Get1(b)) // escape_prefix; more than 8 ones is invalid but read as it comes
+        ++n;
+    const uint32_t uWidth = n + 4;
+    uint32_t uWord = 0;
+    if (uWidth > 16) {
+        const uint32_t uHigh = bits::Get(b, uWidth - 16);
+        uWord = (uHigh << 16) | bits::Get(b, 16);
+    } else {
+        uWord = bits::Get(b, uWidth);
+    }
+    const uint32_t uMagnitude = (uWidth < 32 ? 1u << uWidth : 0u) + uWord;
+    return static_cast<int32_t>(iValue < 0 ? 0u - uMagnitude : uMagnitude);
+}
+
+// Codewords of codebook kBook (1-11) for uCount lines: quadruples for codebooks 1-4, pairs for
+// 5-11; a sign bit per nonzero value in the unsigned books; escapes in codebook 11. One 24-bit
+// peek holds a codeword (at most 16 bits) and its sign bits (at most 4); the reader works on a
+// local copy. Without kStore only the bits are walked.
+template <uint32_t kBook, bool kStore>
+void DecodeLines(VrAACDecoder_OnlyParsing &dec, int16_t *piOut, uint32_t uCount)
+{
+    constexpr uint32_t kDim = kBook <= 4 ? 4 : 2;
+    constexpr bool kSigned = kBook == 1 || kBook == 2 || kBook == 5 || kBook == 6;
+    VrBitReader_OnlyParsing b = dec.Bits;
+    const huffman::SpectralRow row = huffman::RowOf(kBook);
+    for (uint32_t j = 0; j + kDim <= uCount; j += kDim) {
+        const uint32_t uPeek = bits::ShowShort(b, 24);
+        const huffman::SpectralHit hit = huffman::FindSpectral(row, uPeek >> 8);
+        uint32_t uLength = hit.uLength;
+        if constexpr (!kStore) {
+            if constexpr (!kSigned) { // a sign bit for each nonzero byte of the entry
+                uint32_t uQuad;
+                std::memcpy(&uQuad, hit.pEntry->iValue, 4);
+                const uint32_t uNonzero = ((((uQuad & 0x7F7F7F7Fu) + 0x7F7F7F7Fu) | uQuad) & 0x80808080u) >> 7;
+                uLength += (uNonzero * 0x01010101u) >> 24; // the byte sum
+            }
+            bits::Advance(b, uLength);
+            if constexpr (kBook == kEscBook)
+                for (uint32_t d = 0; d < 2; ++d)
+                    if (hit.pEntry->iValue[d] == 16)
+                        EscapeOn(b, 16);
+            continue;
+        }
+        int32_t v[kDim];
+        for (uint32_t d = 0; d < kDim; ++d)
+            v[d] = hit.pEntry->iValue[d];
+        if constexpr (!kSigned) {
+            uint32_t uSigns = 0;
+            for (uint32_t d = 0; d < kDim; ++d)
+                uSigns += v[d] != 0;
+            uLength += uSigns;
+            for (uint32_t d = 0; d < kDim; ++d)
+                if (v[d] != 0 && ((uPeek >> (24 - uLength + --uSigns)) & 1))
                     v[d] = -v[d];
-        if (uBook == kEscBook)
-            for (uint32_t d = 0; d < uDim; ++d)
-                v[d] = Escape(dec, v[d]);
-        for (uint32_t d = 0; d < uDim; ++d)
+        }
+        bits::Advance(b, uLength);
+        if constexpr (kBook == kEscBook)
+            for (uint32_t d = 0; d < kDim; ++d)
+                if (v[d] == 16 || v[d] == -16)
+                    v[d] = EscapeOn(b, v[d]);
+        for (uint32_t d = 0; d < kDim; ++d)
             piOut[j + d] = static_cast<int16_t>(v[d]);
     }
+    dec.Bits = b;
+}
+
+template <bool kStore>
+void DecodeSection(VrAACDecoder_OnlyParsing &dec, uint32_t uBook, int16_t *piOut, uint32_t uCount)
+{
+    using Decode = void (*)(VrAACDecoder_OnlyParsing &, int16_t *, uint32_t);
+    static constexpr Decode kDecode[12] = {
+        nullptr,
+        DecodeLines<1, kStore>, DecodeLines<2, kStore>, DecodeLines<3, kStore>, DecodeLines<4, kStore>,
+        DecodeLines<5, kStore>, DecodeLines<6, kStore>, DecodeLines<7, kStore>, DecodeLines<8, kStore>,
+        DecodeLines<9, kStore>, DecodeLines<10, kStore>, DecodeLines<11, kStore>,
+    };
+    kDecode[uBook](dec, piOut, uCount);
 }
 
 // Group lengths, offsets and the band tops of each group (widths times the group length) of
@@ -235,7 +302,7 @@ uint32_t ScaleFactorData(VrAACDecoder_OnlyParsing &dec, VrICS_OnlyParsing &ics, 
 }
 
 uint32_t SpectralData(VrAACDecoder_OnlyParsing &dec, VrICS_OnlyParsing &ics, const VrICS_OnlyParsing &wics,
-                      uint32_t uChannel, uint32_t uFirstChannel)
+                      uint32_t uChannel, uint32_t uFirstChannel, bool bValues)
 {
     const VrWindowInfo_OnlyParsing *pInfo = InfoOf(dec, wics);
     if (!pInfo || uChannel >= VR_AAC_CHANNELS_OnlyParsing)
@@ -244,17 +311,22 @@ uint32_t SpectralData(VrAACDecoder_OnlyParsing &dec, VrICS_OnlyParsing &ics, con
     int16_t *piLines = dec.iSpectrum[uChannel];
     const uint16_t *puTops = pInfo->uBlockBandTops;
     WalkSections(ics, wics, pInfo->uBandsPerWindow, [&](uint32_t, uint32_t uBook, uint32_t uBand, uint32_t uEnd) {
-        if (uBook == kZeroBook || uBook == kIntensityBook || uBook == kIntensityBook2 || uBook == kReservedBook ||
-            (uBook > kIntensityBook && uBook != kNoiseRepeatBook))
-            return true;
+        if (uEnd <= uBand || uBook == kZeroBook || uBook == kIntensityBook || uBook == kIntensityBook2 ||
+            uBook == kReservedBook || (uBook > kIntensityBook && uBook != kNoiseRepeatBook))
+            return true; // an empty section, or one without spectral data
         const uint32_t uLo = uBand == 0 ? 0 : puTops[uBand - 1];
         const uint32_t uHi = puTops[uEnd - 1] < kLines ? puTops[uEnd - 1] : kLines;
         if (uHi <= uLo)
             return true;
         if (uBook <= kEscBook) {
-            DecodeLines(dec, uBook, piLines + uLo, uHi - uLo);
+            if (bValues)
+                DecodeSection<true>(dec, uBook, piLines + uLo, uHi - uLo);
+            else
+                DecodeSection<false>(dec, uBook, piLines + uLo, uHi - uLo);
             return true;
         }
+        if (!bValues)
+            return true; // noise bands carry no spectral bits
         for (uint32_t band = uBand; band < uEnd; ++band) {
             const uint32_t lo = band == 0 ? 0 : puTops[band - 1], hi = puTops[band] < kLines ? puTops[band] : kLines;
             if (hi <= lo)
@@ -271,29 +343,14 @@ uint32_t SpectralData(VrAACDecoder_OnlyParsing &dec, VrICS_OnlyParsing &ics, con
         }
         return true;
     });
-    if (dec.uPulsePresent)
+    if (dec.uPulsePresent && bValues)
         ApplyPulses(dec, uChannel, dec.Pulse);
     return 1;
 }
 
 int32_t Escape(VrAACDecoder_OnlyParsing &dec, int32_t iValue)
 {
-    if (iValue != 16 && iValue != -16)
-        return iValue;
-    VrBitReader_OnlyParsing &b = dec.Bits;
-    uint32_t n = 0;
-    while (Get1(b)) // escape_prefix; more than 8 ones is invalid but read as it comes
-        ++n;
-    const uint32_t uWidth = n + 4;
-    uint32_t uWord = 0;
-    if (uWidth > 16) {
-        const uint32_t uHigh = Get(b, uWidth - 16);
-        uWord = (uHigh << 16) | Get(b, 16);
-    } else {
-        uWord = Get(b, uWidth);
-    }
-    const uint32_t uMagnitude = (uWidth < 32 ? 1u << uWidth : 0u) + uWord;
-    return static_cast<int32_t>(iValue < 0 ? 0u - uMagnitude : uMagnitude);
+    return iValue == 16 || iValue == -16 ? EscapeOn(dec.Bits, iValue) : iValue;
 }
 
 uint32_t MsMask(VrAACDecoder_OnlyParsing &dec, const VrICS_OnlyParsing &ics)
@@ -375,7 +432,7 @@ void ClearTns(VrTNSInfo_OnlyParsing &tns)
 }
 
 uint32_t Ics(VrAACDecoder_OnlyParsing &dec, VrICS_OnlyParsing &ics, uint32_t uCommonWindow, uint32_t uChannel,
-             uint32_t uFirstChannel, uint32_t uWindowInfoChannel)
+             uint32_t uFirstChannel, uint32_t uWindowInfoChannel, bool bValues)
 {
     if (uChannel >= VR_AAC_CHANNELS_OnlyParsing)
         return 0;
@@ -405,7 +462,7 @@ uint32_t Ics(VrAACDecoder_OnlyParsing &dec, VrICS_OnlyParsing &ics, uint32_t uCo
         ClearTns(dec.TNS[uChannel]);
     if (Get1(b)) // gain_control_data_present: gain control is not supported
         return 0;
-    SpectralData(dec, ics, wics, uChannel, uFirstChannel);
+    SpectralData(dec, ics, wics, uChannel, uFirstChannel, bValues);
     return 1;
 }
 

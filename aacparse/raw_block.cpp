@@ -38,32 +38,33 @@ uint32_t WindowInfoChannel(const VrMCInfo_OnlyParsing &map, uint32_t ch)
 }
 
 // The channel of a single channel or LFE element, or -1.
-int32_t SingleChannel(VrAACDecoder_OnlyParsing &dec, VrMCInfo_OnlyParsing &map)
+int32_t SingleChannel(VrAACDecoder_OnlyParsing &dec, VrMCInfo_OnlyParsing &map, bool bValues)
 {
     dec.iElementExponent = kNoExponent;
     const uint32_t uTag = Get(dec.Bits, 4);
     const int32_t ch = ChannelConfig(dec, kIdSCE, uTag, 0, map);
     if (ch < 0 || ch >= VR_AAC_CHANNELS_OnlyParsing)
         return -1;
-    ClearChannel(dec, static_cast<uint32_t>(ch));
     const auto c = static_cast<uint32_t>(ch);
-    return Ics(dec, dec.ICS[c], 0, c, c, WindowInfoChannel(map, c)) ? ch : -2;
+    if (bValues)
+        ClearChannel(dec, c);
+    return Ics(dec, dec.ICS[c], 0, c, c, WindowInfoChannel(map, c), bValues) ? ch : -2;
 }
 
 } // namespace
 
-uint32_t SingleChannelElement(VrAACDecoder_OnlyParsing &dec, VrMCInfo_OnlyParsing &map)
+uint32_t SingleChannelElement(VrAACDecoder_OnlyParsing &dec, VrMCInfo_OnlyParsing &map, bool bValues)
 {
-    const int32_t ch = SingleChannel(dec, map);
+    const int32_t ch = SingleChannel(dec, map, bValues);
     return ch >= 0 ? 0 : ch == -1 ? 3 : 4;
 }
 
-uint32_t LfeChannelElement(VrAACDecoder_OnlyParsing &dec, VrMCInfo_OnlyParsing &map)
+uint32_t LfeChannelElement(VrAACDecoder_OnlyParsing &dec, VrMCInfo_OnlyParsing &map, bool bValues)
 {
-    return SingleChannel(dec, map) >= 0 ? 1 : 0xFFFFFFFFu;
+    return SingleChannel(dec, map, bValues) >= 0 ? 1 : 0xFFFFFFFFu;
 }
 
-uint32_t ChannelPairElement(VrAACDecoder_OnlyParsing &dec, VrMCInfo_OnlyParsing &map)
+uint32_t ChannelPairElement(VrAACDecoder_OnlyParsing &dec, VrMCInfo_OnlyParsing &map, bool bValues)
 {
     VrBitReader_OnlyParsing &b = dec.Bits;
     dec.iElementExponent = kNoExponent;
@@ -90,11 +91,13 @@ uint32_t ChannelPairElement(VrAACDecoder_OnlyParsing &dec, VrMCInfo_OnlyParsing 
     } else {
         std::memset(dec.uMSMask, 0, sizeof dec.uMSMask);
     }
-    ClearChannel(dec, l);
-    ClearChannel(dec, r);
-    if (!Ics(dec, dec.ICS[l], uCommonWindow, l, l, WindowInfoChannel(map, l)))
+    if (bValues) {
+        ClearChannel(dec, l);
+        ClearChannel(dec, r);
+    }
+    if (!Ics(dec, dec.ICS[l], uCommonWindow, l, l, WindowInfoChannel(map, l), bValues))
         return 7;
-    if (!Ics(dec, dec.ICS[r], uCommonWindow, r, l, WindowInfoChannel(map, r)))
+    if (!Ics(dec, dec.ICS[r], uCommonWindow, r, l, WindowInfoChannel(map, r), bValues))
         return 8;
     return 0;
 }

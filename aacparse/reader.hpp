@@ -4,6 +4,7 @@
 
 #include <array>
 #include <cstdint>
+#include <cstring>
 
 #include <vorcal/aacparse.h>
 
@@ -38,9 +39,28 @@ inline uint32_t Show(const VrBitReader_OnlyParsing &b, uint32_t n) noexcept
     return (iShift < 0 || iShift > 31) ? 0u : uKept >> iShift;
 }
 
+// Show for 1 <= n <= 25, which is always exact: one unaligned big-endian load and two shifts.
+inline uint32_t ShowShort(const VrBitReader_OnlyParsing &b, uint32_t n) noexcept
+{
+    uint32_t uWord;
+    std::memcpy(&uWord, b.pCurrent, 4);
+#if defined(__BYTE_ORDER__) && __BYTE_ORDER__ == __ORDER_LITTLE_ENDIAN__
+    uWord = __builtin_bswap32(uWord);
+#endif
+    return (uWord << b.uBitPos) >> (32 - n);
+}
+
 inline uint32_t Get(VrBitReader_OnlyParsing &b, uint32_t n) noexcept
 {
     const uint32_t uValue = Show(b, n);
+    Advance(b, n);
+    return uValue;
+}
+
+// Get for 1 <= n <= 25.
+inline uint32_t GetShort(VrBitReader_OnlyParsing &b, uint32_t n) noexcept
+{
+    const uint32_t uValue = ShowShort(b, n);
     Advance(b, n);
     return uValue;
 }

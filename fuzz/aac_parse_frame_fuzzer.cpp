@@ -4,7 +4,9 @@
 //  odd:  raw access units. The AudioSpecificConfig is the next 1 + (byte >> 1) % 8 bytes, the
 //        rest access units behind 2-byte big-endian lengths, each in an exact-size copy.
 // Bit 6 of the first byte fails the parser's allocation first. Every result is one of the six,
-// the frame information is consistent, and the parser frees what it took.
+// the frame information is consistent, and the parser frees what it took. Bit 5 also walks each
+// ADTS frame with the exported element parsers on hhDecoder, which store every value (spectral
+// lines, noise, pulses), behind the slack they need (twice the frame and 16 KB of zeros).
 #include <cstddef>
 #include <cstdint>
 #include <vector>
@@ -30,6 +32,29 @@ void Check(int32_t r, const CALAACFrameInfo &info, size_t len)
         TrapUnless(info.uFrameBytes <= len && info.auElements[7] >= 1 && (info.uBits + 7) / 8 <= info.uFrameBytes);
     if (r == 2)
         TrapUnless(info.uFrameBytes > len || len < 9);
+}
+
+void WalkWithValues(const uint8_t *pFrame, size_t uLen)
+{
+    std::vector<uint8_t> buf(pFrame, pFrame + uLen);
+    buf.resize(2 * uLen + 16384, 0);
+    uint32_t rate = 0, channels = 0, samples, sbr, aligned, header;
+    VrAACSBRInfo(nullptr, 0, nullptr, nullptr, nullptr, nullptr, nullptr);
+    VrAACDecInitOnlyParsing(hDecoder, buf.data(), &rate, &channels, &samples, &sbr, &aligned, &header);
+    VrAACDecoder_OnlyParsing *d = hDecoder;
+    static uint8_t scratch[512];
+    uint32_t tag, count, ok = 1;
+    while (ok && VrGetProcessedBits_OnlyParsing(&d->Bits) <= 8 * uLen) {
+        switch (VrGetBits_OnlyParsing(&d->Bits, 3)) {
+        case 0: ok = single_channel_elementOnlyParsing(d, &d->MCInfo) == 0; break;
+        case 1: ok = channel_pair_elementOnlyParsing(d, &d->MCInfo) == 0; break;
+        case 3: ok = lfe_channel_elementOnlyParsing(d, &d->MCInfo) == 1; break;
+        case 4: getdataOnlyParsing(d, &tag, &count, scratch); break;
+        case 5: ok = VrGet_ProgamConfig_OnlyParsing(d) >= 0; huffbookinitOnlyParsing(d); break;
+        case 6: getfillOnlyParsing(d, scratch); break;
+        default: ok = 0; break; // coupling element or ID_END
+        }
+    }
 }
 
 } // namespace
@@ -68,6 +93,8 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *pData, size_t uSize)
             const std::vector<uint8_t> frame(pRest + pos, pRest + size);
             const int32_t r = vorCALTools_AAC_ParseFrame(p, frame.data(), int32_t(frame.size()), &info);
             Check(r, info, frame.size());
+            if ((mode & 0x20) && r != 1 && r != 2)
+                WalkWithValues(frame.data(), info.uFrameBytes);
             pos += r == 1 || r == 2 || info.uFrameBytes == 0 ? 1 : info.uFrameBytes;
         }
     }

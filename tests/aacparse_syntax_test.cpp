@@ -3,6 +3,7 @@
 // everything after it, so the consumed bit count is checked with the values.
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cstdint>
 #include <functional>
 #include <string>
@@ -139,25 +140,11 @@ TEST(AacSyntax, ElementResultsAndEdgeCases)
         // Under a program config element an unknown tag is refused before anything else is read.
         {"SCE unknown tag", [](BitWriter &w) { PutPce(w); w.Put(2, 4).Put(0xFFFF, 16); },
          [](Dec &d) { return AfterPce(d, RunSce); }, 3, 48 + 4},
-        {"SCE tag of the program", [](BitWriter &w) { PutPce(w); w.Put(1, 4); PutSmallIcs(w); },
-         [](Dec &d) { return AfterPce(d, RunSce); }, 0, -1},
         {"LFE", [](BitWriter &w) { w.Put(0, 4); PutSmallIcs(w); }, RunLfe, 1, -1},
         {"LFE unknown tag", [](BitWriter &w) { PutPce(w); w.Put(3, 4); }, [](Dec &d) { return AfterPce(d, RunLfe); }, 0xFFFFFFFF, -1},
         // common_window with ms_mask_present 2: every band of the window is M/S, no mask bits.
-        {"CPE ms_mask_present 2",
-         [](BitWriter &w) {
-             w.Put(0, 4).Put(1, 1);
-             PutLongInfo(w, 1);
-             w.Put(2, 2);
-             PutSmallIcs(w, false);
-             PutSmallIcs(w, false);
-         },
-         RunCpe, 0, -1,
-         [](const Dec &d) {
-             std::vector<int> want(50, 1);
-             want[49] = 0; // 49 bands at 48 kHz
-             EXPECT_EQ(std::vector<int>(d.uMSMask, d.uMSMask + 50), want);
-         }},
+        {"CPE ms_mask_present 2", [](BitWriter &w) { PutLongInfo(w.Put(0, 4).Put(1, 1), 1); PutSmallIcs(w.Put(2, 2), false); PutSmallIcs(w, false); },
+         RunCpe, 0, -1, [](const Dec &d) { EXPECT_EQ(std::count(d.uMSMask, d.uMSMask + 49, 1) + std::count(d.uMSMask + 49, d.uMSMask + 128, 0), 128); }},
         // ms_mask_present 1 in two window groups: max_sfb (2) bits per group, the rest cleared.
         {"CPE short windows ms_mask_present 1",
          [](BitWriter &w) {
@@ -190,11 +177,9 @@ TEST(AacSyntax, ElementResultsAndEdgeCases)
         // sect_len 31 then 3: one section of 34 bands, then codebook 0 to max_sfb 40.
         {"sect_len 31 + 3",
          [](BitWriter &w) {
-             w.Put(0, 4).Put(100, 8);
-             PutLongInfo(w, 40);
+             PutLongInfo(w.Put(0, 4).Put(100, 8), 40);
              PutSections(w, {{1, 34}, {0, 6}});
-             PutZeroScalefactors(w, 34);
-             PutNoTools(w);
+             PutNoTools(w.Put(0, 34)); // 34 scale factor differences of 0
              PutLines(w, 1, std::vector<int>(VrTBL_sfb_48_1024_OnlyParsing[33]));
          },
          RunSce, 0, -1,
@@ -215,24 +200,20 @@ TEST(AacSyntax, ElementResultsAndEdgeCases)
         // pulse_data: two pulses from band 2 (line 8), offsets 3 and 2, amplitudes 5 and 15.
         {"pulses",
          [](BitWriter &w) {
-             w.Put(0, 4).Put(100, 8);
-             PutLongInfo(w, 4);
+             PutLongInfo(w.Put(0, 4).Put(100, 8), 4);
              PutSections(w, {{5, 4}});
-             PutZeroScalefactors(w, 4);
-             w.Put(1, 1).Put(1, 2).Put(2, 6).Put(3, 5).Put(5, 4).Put(2, 5).Put(15, 4).Put(0, 2);
+             w.Put(0, 4).Put(1, 1).Put(1, 2).Put(2, 6).Put(3, 5).Put(5, 4).Put(2, 5).Put(15, 4).Put(0, 2);
              PutLines(w, 5, {0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, -3, 0, 2, 0, 0});
          },
          RunSce, 0, -1, [](const Dec &d) { EXPECT_EQ(std::vector<int>(d.iSpectrum[0] + 8, d.iSpectrum[0] + 14), (std::vector<int>{0, 0, 0, -8, 0, 17})); }},
         // tns_data of a long window: two filters, coef_res 1 (4 bits), compressed to 3 bits in the second.
         {"TNS",
          [](BitWriter &w) {
-             w.Put(0, 4);
-             PutSmallHead(w);
+             PutSmallHead(w.Put(0, 4));
              w.Put(0, 1).Put(1, 1).Put(2, 2).Put(1, 1);
              w.Put(20, 6).Put(3, 5).Put(1, 1).Put(0, 1).Put(0x7, 4).Put(0x8, 4).Put(0xF, 4);
              w.Put(10, 6).Put(2, 5).Put(0, 1).Put(1, 1).Put(0x3, 3).Put(0x4, 3);
-             w.Put(0, 1);
-             PutZeroBand(w);
+             PutZeroBand(w.Put(0, 1));
          },
          RunSce, 0, -1,
          [](const Dec &d) {
@@ -245,8 +226,6 @@ TEST(AacSyntax, ElementResultsAndEdgeCases)
         // Main profile prediction: predictor_reset with its group, then min(max_sfb, 40) bits.
         {"predictor data", [](BitWriter &w) { w.Put(0, 1).Put(0, 2).Put(0, 1).Put(45, 6).Put(1, 1).Put(1, 1).Put(7, 5).Put(0, 40); },
          [](Dec &d) { return get_ics_infoOnlyParsing(&d, &d.ICS[0], 0, 0, 0); }, 1, -1},
-        {"no predictor bit in profile 3", [](BitWriter &w) { w.Put(0, 1).Put(0, 2).Put(0, 1).Put(45, 6); },
-         [](Dec &d) { d.MCInfo.uProfile = 3; return get_ics_infoOnlyParsing(&d, &d.ICS[0], 0, 0, 0); }, 1, -1},
         // fill_element: count 15 and esc_count 0 make 14 bytes; an SBR payload is skipped whole.
         {"fill 15 + 0", [](BitWriter &w) { w.Put(15, 4).Put(0, 8).Put(13, 4).Put(0xABC, 12).Put(0xFF, 8 * 12); },
          [](Dec &d) { return getfillOnlyParsing(&d, buffer); }, 14, 4 + 8 + 8 * 14},

@@ -106,8 +106,16 @@ inline void PutSections(BitWriter &w, const std::vector<std::pair<unsigned, unsi
     }
 }
 
+// n zero bits (BitWriter::Put takes at most 32).
+inline BitWriter &PutZeros(BitWriter &w, unsigned n)
+{
+    while (n--)
+        w.PutBit(0);
+    return w;
+}
+
 // Differences of 0 for n bands: a 1-bit code each.
-inline void PutZeroScalefactors(BitWriter &w, unsigned n) { w.Put(0, n); }
+inline void PutZeroScalefactors(BitWriter &w, unsigned n) { PutZeros(w, n); }
 
 // pulse_data_present, tns_data_present and gain_control_data_present all 0.
 inline void PutNoTools(BitWriter &w) { w.Put(0, 3); }

@@ -179,7 +179,7 @@ TEST(AacSyntax, ElementResultsAndEdgeCases)
          [](BitWriter &w) {
              PutLongInfo(w.Put(0, 4).Put(100, 8), 40);
              PutSections(w, {{1, 34}, {0, 6}});
-             PutNoTools(w.Put(0, 34)); // 34 scale factor differences of 0
+             PutNoTools(PutZeros(w, 34)); // 34 scale factor differences of 0
              PutLines(w, 1, std::vector<int>(VrTBL_sfb_48_1024_OnlyParsing[33]));
          },
          RunSce, 0, -1,
@@ -224,10 +224,10 @@ TEST(AacSyntax, ElementResultsAndEdgeCases)
                        (std::vector<int>{7, -8, -1, 3, -4}));
          }},
         // Main profile prediction: predictor_reset with its group, then min(max_sfb, 40) bits.
-        {"predictor data", [](BitWriter &w) { w.Put(0, 1).Put(0, 2).Put(0, 1).Put(45, 6).Put(1, 1).Put(1, 1).Put(7, 5).Put(0, 40); },
+        {"predictor data", [](BitWriter &w) { w.Put(0, 1).Put(0, 2).Put(0, 1).Put(45, 6).Put(1, 1).Put(1, 1).Put(7, 5); PutZeros(w, 40); },
          [](Dec &d) { return get_ics_infoOnlyParsing(&d, &d.ICS[0], 0, 0, 0); }, 1, -1},
         // fill_element: count 15 and esc_count 0 make 14 bytes; an SBR payload is skipped whole.
-        {"fill 15 + 0", [](BitWriter &w) { w.Put(15, 4).Put(0, 8).Put(13, 4).Put(0xABC, 12).Put(0xFF, 8 * 12); },
+        {"fill 15 + 0", [](BitWriter &w) { w.Put(15, 4).Put(0, 8).Put(13, 4).Put(0xABC, 12).PutBytes(std::vector<uint8_t>(12, 0xFF)); },
          [](Dec &d) { return getfillOnlyParsing(&d, buffer); }, 14, 4 + 8 + 8 * 14},
         {"fill data", [](BitWriter &w) { w.Put(4, 4).Put(1, 4).Put(0, 4).PutBytes({9, 8, 7}); },
          [](Dec &d) { return getfillOnlyParsing(&d, buffer); }, 4, -1,

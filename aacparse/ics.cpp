@@ -64,16 +64,41 @@ bool WalkSections(const VrICS_OnlyParsing &ics, const VrICS_OnlyParsing &wics, u
     return true;
 }
 
-int32_t ScalefactorDiff(VrBitReader_OnlyParsing &b)
+// A bit offset from the reader's byte for inner loops, written back by Sync: one register
+// instead of the reader's three fields.
+struct Cursor {
+    VrBitReader_OnlyParsing &b;
+    const uint8_t *p;
+    uint32_t uBit, uStart;
+    explicit Cursor(VrBitReader_OnlyParsing &r) : b(r), p(r.pCurrent), uBit(r.uBitPos), uStart(r.uBitPos) {}
+    // The next n bits, 1 <= n <= 25.
+    uint32_t Peek(uint32_t n) const
+    {
+        uint32_t uWord;
+        std::memcpy(&uWord, p + (uBit >> 3), 4);
+#if defined(__BYTE_ORDER__) && __BYTE_ORDER__ == __ORDER_LITTLE_ENDIAN__
+        uWord = __builtin_bswap32(uWord);
+#endif
+        return (uWord << (uBit & 7)) >> (32 - n);
+    }
+    void Sync()
+    {
+        bits::Advance(b, uBit - uStart);
+        p = b.pCurrent;
+        uBit = uStart = b.uBitPos;
+    }
+};
+
+int32_t ScalefactorDiff(Cursor &c)
 {
-    const uint32_t uPeek = bits::ShowShort(b, 19);
+    const uint32_t uPeek = c.Peek(19);
     // Level 0 directly (most differences have codes of up to 6 bits), else the level search.
     const int32_t v = static_cast<int32_t>(uPeek >> 13) - static_cast<int32_t>(MaxVal_sclOnlyParsing[0]);
     const huffman::ScalefactorHit hit =
         v <= 0 ? huffman::ScalefactorHit{bookscl0OnlyParsing[static_cast<int32_t>(CBsize_sclOnlyParsing[0]) + v],
                                          huffman::kScalefactorLength0[static_cast<uint32_t>(static_cast<int32_t>(CBsize_sclOnlyParsing[0]) + v)]}
                : huffman::FindScalefactor(huffman::kScalefactor, uPeek);
-    bits::Advance(b, hit.uLength);
+    c.uBit += hit.uLength;
     return static_cast<int32_t>(hit.uIndex) - 60;
 }
 
@@ -106,24 +131,44 @@ void DecodeLines(VrAACDecoder_OnlyParsing &dec, int16_t *piOut, uint32_t uCount)
     constexpr bool kSigned = kBook == 1 || kBook == 2 || kBook == 5 || kBook == 6;
     VrBitReader_OnlyParsing b = dec.Bits;
     const huffman::SpectralRow row = huffman::RowOf(kBook);
-    for (uint32_t j = 0; j + kDim <= uCount; j += kDim) {
-        const uint32_t uPeek = bits::ShowShort(b, 24);
-        const huffman::SpectralHit hit = huffman::FindSpectral(row, uPeek >> 8);
-        uint32_t uLength = hit.uLength;
-        if constexpr (!kStore) {
+    if constexpr (!kStore) {
+        // The walk keeps one bit offset from the reader's byte and updates the reader at the end
+        // (and around escapes, which read through it).
+        const uint8_t *p = b.pCurrent;
+        uint32_t uBit = b.uBitPos, uSynced = b.uBitPos;
+        for (uint32_t j = 0; j + kDim <= uCount; j += kDim) {
+            uint32_t uWord;
+            std::memcpy(&uWord, p + (uBit >> 3), 4);
+#if defined(__BYTE_ORDER__) && __BYTE_ORDER__ == __ORDER_LITTLE_ENDIAN__
+            uWord = __builtin_bswap32(uWord);
+#endif
+            const huffman::SpectralHit hit = huffman::FindSpectral(row, (uWord << (uBit & 7)) >> 16);
+            uBit += hit.uLength;
             if constexpr (!kSigned) { // a sign bit for each nonzero byte of the entry
                 uint32_t uQuad;
                 std::memcpy(&uQuad, hit.pEntry->iValue, 4);
                 const uint32_t uNonzero = ((((uQuad & 0x7F7F7F7Fu) + 0x7F7F7F7Fu) | uQuad) & 0x80808080u) >> 7;
-                uLength += (uNonzero * 0x01010101u) >> 24; // the byte sum
+                uBit += (uNonzero * 0x01010101u) >> 24; // the byte sum
             }
-            bits::Advance(b, uLength);
-            if constexpr (kBook == kEscBook)
-                for (uint32_t d = 0; d < 2; ++d)
-                    if (hit.pEntry->iValue[d] == 16)
-                        EscapeOn(b, 16);
-            continue;
+            if constexpr (kBook == kEscBook) {
+                if (hit.pEntry->iValue[0] == 16 || hit.pEntry->iValue[1] == 16) {
+                    bits::Advance(b, uBit - uSynced);
+                    for (uint32_t d = 0; d < 2; ++d)
+                        if (hit.pEntry->iValue[d] == 16)
+                            EscapeOn(b, 16);
+                    p = b.pCurrent;
+                    uBit = uSynced = b.uBitPos;
+                }
+            }
         }
+        bits::Advance(b, uBit - uSynced);
+        dec.Bits = b;
+        return;
+    }
+    for (uint32_t j = 0; j + kDim <= uCount; j += kDim) {
+        const uint32_t uPeek = bits::ShowShort(b, 24);
+        const huffman::SpectralHit hit = huffman::FindSpectral(row, uPeek >> 8);
+        uint32_t uLength = hit.uLength;
         int32_t v[kDim];
         for (uint32_t d = 0; d < kDim; ++d)
             v[d] = hit.pEntry->iValue[d];
@@ -264,41 +309,53 @@ uint32_t ScaleFactorData(VrAACDecoder_OnlyParsing &dec, VrICS_OnlyParsing &ics, 
     int32_t iFactor = static_cast<int32_t>(uGlobalGain), iPosition = 0;
     int32_t iNoise = static_cast<int32_t>(uGlobalGain) - kNoiseOffset;
     bool bFirstNoise = true;
-    return WalkSections(ics, wics, pInfo->uBandsPerWindow, [&](uint32_t i, uint32_t uBook, uint32_t uFirst, uint32_t uEnd) {
-        for (uint32_t band = uFirst; band < uEnd; ++band) {
-            switch (uBook) {
-            case kZeroBook:
+    Cursor c(b);
+    const bool bDone = WalkSections(ics, wics, pInfo->uBandsPerWindow, [&](uint32_t i, uint32_t uBook, uint32_t uFirst, uint32_t uEnd) {
+        switch (uBook) {
+        case kZeroBook:
+            for (uint32_t band = uFirst; band < uEnd; ++band)
                 piFactor[band] = 0;
-                break;
-            case kReservedBook:
-                return false;
-            case kNoiseBook:
-            case kNoiseRepeatBook:
-                iNoise += bFirstNoise ? static_cast<int32_t>(Get(b, 9)) - 256 : ScalefactorDiff(b);
+            return true;
+        case kReservedBook:
+            return uFirst == uEnd;
+        case kNoiseBook:
+        case kNoiseRepeatBook:
+            for (uint32_t band = uFirst; band < uEnd; ++band) {
+                if (bFirstNoise) {
+                    iNoise += static_cast<int32_t>(c.Peek(9)) - 256;
+                    c.uBit += 9;
+                } else {
+                    iNoise += ScalefactorDiff(c);
+                }
                 bFirstNoise = false;
                 piFactor[band] = static_cast<int16_t>(iNoise);
                 if (dec.uMSMask[band]) { // the same noise as the first channel of the pair
                     dec.uMSMask[band] = 0;
                     ics.Section[i].uCodebook = kNoiseRepeatBook;
                 }
-                break;
-            case kIntensityBook2:
-            case kIntensityBook:
-                iPosition += ScalefactorDiff(b);
+            }
+            return true;
+        case kIntensityBook2:
+        case kIntensityBook:
+            for (uint32_t band = uFirst; band < uEnd; ++band) {
+                iPosition += ScalefactorDiff(c);
                 piFactor[band] = static_cast<int16_t>(iPosition);
                 piSign[band] = dec.uMSMask[band] ? -1 : 1; // M/S inverts the intensity sign
                 dec.uMSMask[band] = 0;
-                break;
-            default:
-                iFactor += ScalefactorDiff(b);
+            }
+            return true;
+        default:
+            for (uint32_t band = uFirst; band < uEnd; ++band) {
+                iFactor += ScalefactorDiff(c);
                 if (iFactor < 0 || iFactor > 255)
                     return false;
                 piFactor[band] = static_cast<int16_t>(iFactor);
-                break;
             }
+            return true;
         }
-        return true;
-    }) ? 1 : 0;
+    });
+    c.Sync();
+    return bDone ? 1 : 0;
 }
 
 uint32_t SpectralData(VrAACDecoder_OnlyParsing &dec, VrICS_OnlyParsing &ics, const VrICS_OnlyParsing &wics,

@@ -6,7 +6,6 @@ namespace vorcal::aacparse {
 namespace {
 
 constexpr uint32_t kChannels = VR_AAC_CHANNELS_OnlyParsing;
-constexpr uint32_t kIdCPE = 1; // id_syn_ele of a channel pair element
 
 // Fills the records of one single channel element (one channel) or channel pair element (two)
 // from index uFirst on; the caller has checked that they fit.

@@ -16,11 +16,11 @@ constexpr uint32_t kNoSync = 9;
 constexpr uint32_t kProfileLC = 1;    // ADTS profile 1: AAC LC
 constexpr uint32_t kIndex44100 = 4;
 
-void Reset()
+} // namespace
+
+void ResetDecoder(VrAACDecoder_OnlyParsing &dec)
 {
-    hDecoder = &hhDecoder;
-    std::memset(&hhDecoder, 0, sizeof hhDecoder);
-    VrAACDecoder_OnlyParsing &dec = hhDecoder;
+    std::memset(&dec, 0, sizeof dec);
     dec.uResetOne[0] = 1;
     dec.uResetOne[1] = 1;
     dec.iSelectedTag = -1;
@@ -32,6 +32,14 @@ void Reset()
     dec.uImplicitConfig = 1;
     dec.MCInfo.uProfile = kProfileLC;
     dec.uImplicitCPE = 0;
+}
+
+namespace {
+
+void Reset()
+{
+    hDecoder = &hhDecoder;
+    ResetDecoder(hhDecoder);
 }
 
 } // namespace

@@ -15,14 +15,11 @@ int32_t SampleExponent(int16_t iSample)
 {
     if (iSample == 0)
         return -15;
-    uint32_t m = static_cast<uint16_t>(iSample < 0 ? ~iSample : iSample);
+    const uint32_t m = static_cast<uint16_t>(iSample < 0 ? ~iSample : iSample);
     if (m == 0)
         return -30;
-    int32_t iShifts = 0;
-    while (m < 16384) {
-        m <<= 1;
-        ++iShifts;
-    }
+    // A magnitude of bit length L (1-15) needs 15 - L shifts; 16 bits (a complement) need none.
+    const int32_t iShifts = m >= 16384 ? 0 : __builtin_clz(m) - 17;
     return -15 - iShifts;
 }
 

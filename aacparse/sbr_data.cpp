@@ -267,9 +267,10 @@ extern "C" void sbrDecodeInitOnlyParsing(void *, VrSBRState_OnlyParsing *pSbr, u
     pSbr->uTimeRate = 1;
 }
 
-extern "C" int32_t sbr_extension_dataOnlyParsing(VrBitReader_OnlyParsing *pBits, VrSBRState_OnlyParsing *pSbr,
-                                                 uint32_t uElementId)
+int32_t vorcal::aacparse::sbr::ExtensionData(VrBitReader_OnlyParsing *pBits, VrSBRState_OnlyParsing *pSbr,
+                                             uint32_t uElementId, bool &bTables)
 {
+    bTables = false;
     if (Bits(pBits, 4) == kExtensionSbrCrc)
         VrFlushBits_OnlyParsing(pBits, 10); // bs_sbr_crc_bits
     const uint32_t uHeaderFlag = Bits(pBits, 1);
@@ -281,8 +282,16 @@ extern "C" int32_t sbr_extension_dataOnlyParsing(VrBitReader_OnlyParsing *pBits,
     const int32_t k2 = StopBand(*pSbr, k0);
     if (!WithinBandLimit(pSbr->uSampleRate, k0, k2) || !BuildBandTables(pSbr, k0, k2))
         return 1;
+    bTables = true;
 
     if (uElementId == 0) // single channel element
         return ParseSingleChannel(pBits, pSbr, pSbr->uTimeRate ? 2 : 1);
     return uElementId == 1 ? 1 : 0; // channel pair SBR data is not parsed
+}
+
+extern "C" int32_t sbr_extension_dataOnlyParsing(VrBitReader_OnlyParsing *pBits, VrSBRState_OnlyParsing *pSbr,
+                                                 uint32_t uElementId)
+{
+    bool bTables = false;
+    return ExtensionData(pBits, pSbr, uElementId, bTables);
 }

@@ -4,7 +4,7 @@
 
 namespace vorcal::aacparse {
 
-void InfoInit(VrAACDecoder_OnlyParsing &dec, const VrSampRateInfo_OnlyParsing &row)
+void InfoInit(VrAACDecoder_OnlyParsing &dec, const VrSampRateInfo_OnlyParsing &row, uint16_t (&uWidths)[16])
 {
     // Clamped so that a foreign row cannot index past the records.
     const uint32_t uLongBands = row.uLongBands < VR_AAC_MAX_BANDS_OnlyParsing ? row.uLongBands : VR_AAC_MAX_BANDS_OnlyParsing;
@@ -28,7 +28,7 @@ void InfoInit(VrAACDecoder_OnlyParsing &dec, const VrSampRateInfo_OnlyParsing &r
     uint16_t uPrev = 0;
     for (uint32_t k = 0; k < 16; ++k) {
         const uint16_t uTop = k < uShortBands ? row.puShortTops[k] : uPrev;
-        sfbwidth128OnlyParsing[k] = static_cast<uint16_t>(uTop - uPrev);
+        uWidths[k] = static_cast<uint16_t>(uTop - uPrev);
         uPrev = uTop;
     }
 
@@ -41,7 +41,7 @@ void InfoInit(VrAACDecoder_OnlyParsing &dec, const VrSampRateInfo_OnlyParsing &r
     sw.uBandsPerBlock = 8 * uShortBands;
     sw.uSectionBits = 3;
     sw.puBandTops = row.puShortTops;
-    sw.puShortBandWidths = sfbwidth128OnlyParsing;
+    sw.puShortBandWidths = uWidths;
     for (uint32_t w = 0; w < 8; ++w) {
         for (uint32_t k = 0; k < uShortBands; ++k)
             sw.uBlockBandTops[w * uShortBands + k] = static_cast<uint16_t>(128 * w + row.puShortTops[k]);

@@ -312,7 +312,14 @@ extern "C" int32_t Pow_mn(int32_t m, int32_t n, int32_t p, int32_t q)
     Log2_exp(m, &e1, &f1);
     Log2_exp(n, &e2, &f2);
     Div_exp(p, q, &qi, &qf);
-    // The difference pair has no borrow between its parts: the fraction may be negative.
+    // The difference pair has no borrow between its parts: the fraction may be negative, and so
+    // may the product's. One is borrowed from the integer part so that the power of two reads its
+    // table inside its range and stands for the same exponent (the product's fraction is at least
+    // -32768).
     Mul_exp(e1 - e2, f1 - f2, qi, qf, &re, &rf);
+    if (rf < 0) {
+        re -= 1;
+        rf += 32768;
+    }
     return To32(int64_t{To32(int64_t{n} * Pow2_s(re, rf))} + 16384) >> 15;
 }

@@ -47,11 +47,12 @@ TEST(FixMath, WorkedValues)
         {Pow2(30, 0), 0x40000000}, {Pow2(31, 0), 0}, {Pow2_s(0, 0), 32768}, {Pow2_s(-1, 16384), 23170}, {Pow2_s(-16, 0), 1},
         {Pow2_s(-17, 0), 0}, {Pow2_s(16, 0), 0}, {Pow2_frac(-1), 16384}, {Pow2_frac(-15), 1}, {Pow2_frac(-16), 0},
         {Pow2_s(1, -9584), Pow2_s(1, 656)}, {Pow2_s(0, 40000), Pow2_s(0, 31744 + (40000 & 0x3FF))}});
-    // A negative fraction of Pow_mn's exponent pair reads the table at its start: 3 (8/3)^(1/2) gives 6.
+    // Pow_mn borrows one from the integer part of a negative fraction: 3 (8/3)^(1/2) = 4.899 gives 5
+    // (with the table read at its start it gave 6).
     Rows<int32_t>("logarithms and Pow_mn", {{VorLog2(32768), 0}, {VorLog2(65536), 32768}, {VorLog2(98304), 51935},
         {VorLog2(2), -458752}, {VorLog2(1), 0}, {Log2_ceil(1), 0}, {Log2_ceil(0), 0}, {Log2_ceil(1024), 10},
         {Log2_ceil(1025), 11}, {Log2_ceil((1 << 20) + 1), 20}, {Pow_mn(64, 16, 1, 2), 32}, {Pow_mn(32, 8, 1, 3), 13},
-        {Pow_mn(48, 12, 3, 4), 34}, {Pow_mn(48, 12, 3, 0), 0}, {Pow_mn(8, 3, 1, 2), 6}});
+        {Pow_mn(48, 12, 3, 4), 34}, {Pow_mn(48, 12, 3, 0), 0}, {Pow_mn(8, 3, 1, 2), 5}});
     Rows<Pair>("pairs", {{DivPair(1, 3), {0, 10922}}, {DivPair(7, 2), {3, 16384}}, {DivPair(0, 0), {1, 0}},
         {DivPair(5, 0), {0, 0}}, {DivPair(-1, 3), {0, 0}}, {DivPair(1, -3), {0, 0}}, {MulPair(1, 16384, 1, 16384), {2, 8192}},
         {Log2Pair(3), {1, 19167}}, {Log2Pair(1000), {9, 31644}}, {Log2Pair(0x7FFFFFFF), {30, 32766}}, {Log2Pair(1), {0, 0}},
@@ -110,9 +111,9 @@ TEST(FixMath, AgainstExactAndDoubleReferences)
             ASSERT_NEAR(Pow2(e, f), e <= 30 ? v : 0.0, e <= 30 ? v / 8192.0 + 1.0 : 0.0) << e << ',' << f;
             ASSERT_NEAR(Pow2_s(e, f), e >= -16 && e <= 15 ? v * 32768.0 : 0.0, e <= 15 ? v * 4.0 + 1.0 : 0.0) << e << ',' << f;
         }
-    // With n a power of two the exponent pair keeps a non-negative fraction.
+    // Any n: a negative fraction of the exponent pair borrows from its integer part.
     for (int32_t m = 1; m <= 1024; m += 3)
-        for (int32_t n = 1; n <= m; n *= 2)
+        for (int32_t n = 1; n <= m; n = n * 3 / 2 + 1)
             for (int32_t q = 1; q <= 8; ++q)
                 for (int32_t p = 0; p <= q; ++p) {
                     const double v = n * std::pow(double(m) / n, double(p) / q);

@@ -3,16 +3,21 @@
 // so the consumed bit count is checked throughout); the trees against the same codebooks.
 #include <gtest/gtest.h>
 
+#include <algorithm>
+#include <cmath>
 #include <cstdint>
 #include <fstream>
 #include <iterator>
 #include <map>
+#include <memory>
 #include <sstream>
 #include <string>
 #include <tuple>
 #include <vector>
 
 #include <vorcal/aacparse.h>
+#include <vorcal/audio_tools.h>
+#include <vorcal/vorsal.h>
 
 #include "bit_writer.hpp"
 
@@ -258,8 +263,172 @@ TEST(SbrHuffman, TreesDecodeEveryCodeword)
     }
 }
 
-// The ADTS silence templates for SBR streams carry real SBR payloads inside a fill element;
-// an end-to-end check that feeds them through sbr_extension_dataOnlyParsing plugs in here once
-// the raw data block parsers can locate the extension payload.
+// ISO/IEC 14496-3 4.6.18.3.2.1 in double precision: the master frequency band table, and how
+// close the nearest of its rounded quantities (band counts, band borders) came to a half.
+std::pair<std::vector<int>, double> DoubleMaster(int k0, int k2, int freqScale, int alterScale)
+{
+    double margin = 1.0;
+    auto nint = [&margin](double x) { margin = std::min(margin, std::fabs(x - std::floor(x) - 0.5)); return int(std::floor(x + 0.5)); };
+    std::vector<int> table = {k0};
+    if (freqScale == 0) {
+        const int dk = alterScale ? 2 : 1, n = alterScale ? 2 * nint((k2 - k0) / 4.0) : 2 * ((k2 - k0) / 2);
+        std::vector<int> d(size_t(std::max(n, 0)), dk);
+        for (int diff = k2 - (k0 + n * dk), k = diff > 0 ? n - 1 : 0, incr = diff > 0 ? -1 : 1; diff != 0; k += incr, diff += incr)
+            d[size_t(k)] -= incr;
+        for (int v : d)
+            table.push_back(table.back() + v);
+        return {table, margin};
+    }
+    const int bands = freqScale == 1 ? 12 : freqScale == 2 ? 10 : 8;
+    const bool twoRegions = double(k2) / k0 > 2.2449;
+    const int k1 = twoRegions ? 2 * k0 : k2;
+    auto widths = [&](int lo, int hi, double warp) {
+        const int n = 2 * nint(bands * std::log(double(hi) / lo) / (2 * std::log(2.0) * warp));
+        std::vector<int> d;
+        for (int k = 0; k < n; ++k)
+            d.push_back(nint(lo * std::pow(double(hi) / lo, (k + 1.0) / n)) - nint(lo * std::pow(double(hi) / lo, double(k) / n)));
+        std::sort(d.begin(), d.end());
+        return d;
+    };
+    const std::vector<int> d0 = widths(k0, k1, 1.0);
+    std::vector<int> d1 = twoRegions ? widths(k1, k2, alterScale ? 1.3 : 1.0) : std::vector<int>{};
+    if (!d0.empty() && !d1.empty() && d1[0] < d0.back()) {
+        const int change = d0.back() - d1[0];
+        d1[0] += change;
+        d1.back() -= change;
+        std::sort(d1.begin(), d1.end());
+    }
+    for (const auto &d : {d0, d1})
+        for (int v : d)
+            table.push_back(table.back() + v);
+    return {table, margin};
+}
+
+// Every rate and header combination (bs_start_freq, bs_stop_freq, bs_freq_scale, bs_alter_scale)
+// within the band limits. The fixed-point tables equal the double-precision ones except where a
+// rounded quantity lies within 0.001 of a half and the Q15 arithmetic lands on its other side:
+// 8 combinations (6 distinct tables), e.g. k0 11, k2 37 (12 log2(37/22) / 2 = 4.50013) and
+// 23 (47/23)^(3/10) = 28.49961.
+TEST(SbrBands, MasterTablesAgainstDoublePrecision)
+{
+    int tables = 0, differ = 0;
+    for (uint32_t rate : {96000, 88200, 64000, 48000, 44100, 32000, 24000, 22050, 16000, 12000, 11025, 8000})
+        for (uint32_t start = 0; start < 16; ++start)
+            for (uint32_t stop = 0; stop < 16; ++stop)
+                for (uint32_t scale = 0; scale < 4; ++scale)
+                    for (uint32_t alter = 0; alter < 2; ++alter) {
+                        BitWriter w;
+                        PutHeader(w, 1, start, stop, 0, scale, alter, 2);
+                        VrSBRState_OnlyParsing sbr = Fresh(rate);
+                        if (Parse(w, sbr, 2).first != 0)
+                            continue; // beyond the band limits
+                        ++tables;
+                        const auto [want, margin] = DoubleMaster(sbr.uMaster[0], sbr.uMaster[sbr.uNumMaster], int(scale), int(alter));
+                        if (Row(sbr.uMaster, sbr.uNumMaster + 1) == want)
+                            continue;
+                        ++differ;
+                        EXPECT_LT(margin, 0.001) << rate << " Hz, header " << start << ' ' << stop << ' ' << scale << ' ' << alter;
+                    }
+    EXPECT_EQ(std::make_pair(tables, differ), std::make_pair(18922, 8));
+}
+
+// A minimal single channel element (max_sfb 0) or channel pair, a fill element with one SBR
+// payload (padded to its byte count, which countDelta changes), ID_END, behind an ADTS header at
+// 44100 Hz. Single channel SBR data: FIXFIX with one low-resolution envelope and zero deltas,
+// optionally with 1 byte of parametric stereo extended data.
+struct SbrCase { const char *name; bool header; uint32_t start, stop; bool ps, pair; int countDelta; uint32_t sbr, psFound; };
+std::vector<uint8_t> SbrFrame(const SbrCase &c)
+{
+    BitWriter payload;
+    if (c.header)
+        PutHeader(payload, 1, c.start, c.stop, 0, 0, 0, 3);
+    else
+        payload.Put(13, 4).Put(0, 1);
+    if (!c.pair) {
+        payload.Put(0, 1).Put(0, 5).Put(0, 2).Put(0, 2 * kNoiseBands).Put(40, 7);
+        PutCodes(payload, "f_huffman_env_1_5dB", std::vector<int>(kLow - 1, 0));
+        payload.Put(9, 5);
+        PutCodes(payload, "f_huffman_env_3_0dB", std::vector<int>(kNoiseBands - 1, 0));
+        payload.Put(0, 1).Put(c.ps, 1).Put(1, c.ps ? 4 : 0).Put(2, c.ps ? 2 : 0).Put(0x2A, c.ps ? 6 : 0);
+    }
+    payload.Align();
+    const auto count = uint32_t(int(payload.Bytes().size()) + c.countDelta);
+    std::vector<uint8_t> bytes = payload.Bytes();
+    bytes.resize(count, 0);
+    BitWriter raw;
+    raw.Put(c.pair ? 1 : 0, 3).Put(0, 4).Put(0, c.pair ? 1 : 0);
+    for (int ch = 0; ch < (c.pair ? 2 : 1); ++ch)
+        raw.Put(80, 8).Put(0, 11).Put(0, 3); // global_gain, long ics_info with max_sfb 0, no tools
+    raw.Put(6, 3).Put(count < 15 ? count : 15, 4).Put(count - 14, count < 15 ? 0 : 8).PutBytes(bytes).Put(7, 3).Align();
+    const auto len = uint32_t(raw.Bytes().size() + 7);
+    BitWriter adts;
+    adts.Put(0xFFF1, 16).Put(1, 2).Put(4, 4).Put(0, 1).Put(c.pair ? 2 : 1, 3).Put(0, 4).Put(len, 13).Put(0x7FF, 11).Put(0, 2);
+    return adts.PutBytes(raw.Bytes()).Bytes();
+}
+
+// SBR and parametric stereo found by the whole-frame parser in hand-built frames, frame after
+// frame on one parser: an SBR header stays in force across frames; the fill element's count,
+// not what the SBR parser read, decides where the walk resumes.
+TEST(SbrFrame, FoundByTheWholeFrameParser)
+{
+    const SbrCase cases[] = {
+        {"no header yet", false, 0, 0, true, false, 0, 0, 0}, // the data cannot be read without one
+        {"header and parametric stereo", true, 5, 0, true, false, 0, 1, 1},
+        {"header in force", false, 0, 0, false, false, 0, 1, 0},
+        {"fill bytes after the SBR data", false, 0, 0, true, false, 3, 1, 1},
+        {"count short of the extended data", false, 0, 0, true, false, -2, 1, 0},
+        {"bands beyond the limit", true, 0, 11, false, false, 0, 0, 0},
+        {"channel pair", true, 5, 0, false, true, 2, 1, 0},
+    };
+    std::unique_ptr<CALAACParser, decltype(&vorCALTools_AAC_DestroyParser)> parser(vorCALTools_AAC_CreateParser(nullptr, 0),
+                                                                                 vorCALTools_AAC_DestroyParser);
+    for (const SbrCase &c : cases) {
+        SCOPED_TRACE(c.name);
+        const std::vector<uint8_t> frame = SbrFrame(c);
+        CALAACFrameInfo info;
+        EXPECT_EQ(vorCALTools_AAC_ParseFrame(parser.get(), frame.data(), int32_t(frame.size()), &info), 0);
+        EXPECT_EQ(std::make_tuple(info.uSBR, info.uPS, info.uOutSampleRate, info.uOutChannels, info.auElements[6]),
+                  std::make_tuple(c.sbr, c.psFound, kRate << c.sbr, c.psFound ? 2u : c.pair ? 2u : 1u, 1u));
+    }
+}
+
+// The ADTS silence templates carry real SBR payloads inside a fill element (modes 2-4, 4 with
+// parametric stereo). The whole-frame parser walks each to its end; the raw data block parsers
+// locate the payload, and the SBR parser reads it within its byte count.
+TEST(SbrFrame, SilenceTemplates)
+{
+    for (int32_t mode = 0; mode <= 4; ++mode) {
+        SCOPED_TRACE(mode);
+        const bool pair = mode == 1 || mode == 3, sbr = mode >= 2, ps = mode == 4;
+        uint8_t *pFrame = nullptr;
+        uint32_t len = 0;
+        ASSERT_EQ(AAC_MuteFrame(&pFrame, &len, 0, 44100, pair ? 2 : 1, 1, mode), 0);
+        std::vector<uint8_t> frame(pFrame, pFrame + len);
+        g_vorSALMemoryTable->Free(pFrame);
+        std::unique_ptr<CALAACParser, decltype(&vorCALTools_AAC_DestroyParser)> parser(vorCALTools_AAC_CreateParser(nullptr, 0),
+                                                                                     vorCALTools_AAC_DestroyParser);
+        CALAACFrameInfo info;
+        ASSERT_EQ(vorCALTools_AAC_ParseFrame(parser.get(), frame.data(), int32_t(len), &info), 0);
+        // The header carries the caller's rate as the core rate in every mode.
+        EXPECT_EQ(std::make_tuple(info.uSampleRate, info.uOutSampleRate, info.uSBR, info.uPS, info.uOutChannels, (info.uBits + 7) / 8),
+                  std::make_tuple(44100u, 44100u << sbr, uint32_t(sbr), uint32_t(ps), pair || ps ? 2u : 1u, len));
+        if (!sbr)
+            continue;
+        frame.resize(len + 64, 0);
+        uint32_t rate = 0, channels = 0, samples, flag, aligned, headerBits;
+        VrAACSBRInfo(nullptr, 0, nullptr, nullptr, nullptr, nullptr, nullptr);
+        VrAACDecInitOnlyParsing(hDecoder, frame.data(), &rate, &channels, &samples, &flag, &aligned, &headerBits);
+        VrBitReader_OnlyParsing &bits = hDecoder->Bits;
+        ASSERT_EQ(VrGetBits_OnlyParsing(&bits, 3), pair ? 1u : 0u);
+        ASSERT_EQ(pair ? channel_pair_elementOnlyParsing(hDecoder, &hDecoder->MCInfo) : single_channel_elementOnlyParsing(hDecoder, &hDecoder->MCInfo), 0u);
+        ASSERT_EQ(VrGetBits_OnlyParsing(&bits, 3), 6u);
+        const uint32_t count = VrGetBits_OnlyParsing(&bits, 4), start = VrGetProcessedBits_OnlyParsing(&bits);
+        EXPECT_EQ(count, 8u + uint32_t(mode)); // 10, 11, 12
+        VrSBRState_OnlyParsing state = Fresh(44100);
+        EXPECT_EQ(sbr_extension_dataOnlyParsing(&bits, &state, pair ? 1 : 0), ps ? 2 : 1);
+        EXPECT_EQ(state.uHeaderCount, 1u);
+        EXPECT_LE(VrGetProcessedBits_OnlyParsing(&bits) - start, 8 * count);
+    }
+}
 
 } // namespace

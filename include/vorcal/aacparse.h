@@ -1,6 +1,7 @@
 /*
  * vorcal/aacparse.h - the parse-only AAC decoder: bit reader, state record, stream headers,
- * SBR extension parsing and the detection entry VrAACSBRInfo.
+ * raw data block syntax, a reentrant whole-frame parser, SBR extension parsing and the
+ * detection entry VrAACSBRInfo.
  */
 #ifndef VORCAL_AACPARSE_H
 #define VORCAL_AACPARSE_H
@@ -342,7 +343,162 @@ VORCAL_API void infoinitOnlyParsing(VrAACDecoder_OnlyParsing *pDec, const VrSamp
 VORCAL_API void gen_rand_vectorOnlyParsing(int16_t *piVector, int16_t *piExponent, int32_t iLength,
                                            int32_t *piSeed);
 
+/* ------------------------------------------------------------------------------------------
+ * Raw data block syntax.
+ *
+ * The syntactic elements of a raw_data_block (ISO/IEC 13818-7 8.2, ISO/IEC 14496-3 4.4.2):
+ * channel elements with their individual channel streams, fill elements with their extension
+ * payloads, data stream elements. They read through the state's bit reader (no end bound: the
+ * caller's buffer needs slack), keep what they parse in the state's working area and produce
+ * no audio. Extension payloads are skipped whatever their type. Each returns an unsigned
+ * 32-bit code; those without a result return 0. There is no loop over a raw data block here:
+ * the caller reads id_syn_ele and dispatches (the whole-frame parser below does so).
+ * ---------------------------------------------------------------------------------------- */
 
+#define VR_AAC_SPECTRAL_LEVELS_OnlyParsing 11     /* levels per spectral codebook (codes of up to 16 bits) */
+#define VR_AAC_SCALEFACTOR_LEVELS_OnlyParsing 14  /* levels of the scale factor codebook (up to 19 bits) */
+
+/* One entry of a spectral codebook level: the quantised values of one codeword, w x y z for
+ * codebooks 1-4, y z and two zero bytes for codebooks 5-11 (magnitudes in the unsigned books). */
+typedef struct VrSpectralEntry_OnlyParsing {
+    int8_t iValue[4];
+} VrSpectralEntry_OnlyParsing;
+
+/* The spectral codebooks 1-11 of ISO/IEC 13818-7 in levels, one row per codebook number (rows
+ * 0 and 12 are empty): level 0 is a direct table of the next 6 bits holding every code of up
+ * to 6 bits, level k (1-10) the codes of exactly 6 + k bits in code order (null without codes). */
+VORCAL_API extern const VrSpectralEntry_OnlyParsing *const bookOnlyParsing[13][11];
+/* Index of each level's last entry (0 for a level without codes). */
+VORCAL_API extern const uint8_t CBsizeOnlyParsing[13][11];
+/* Largest code value of each level, as a (6 + k)-bit number (level 0: its last 6-bit slot); a
+ * level without codes holds ((previous + 1) << 1) - 1, which no code of its length reaches. */
+VORCAL_API extern const uint16_t MaxValOnlyParsing[13][11];
+/* The scale factor codebook in the same arrangement, 14 levels; each entry is the scale factor
+ * index 0-120 (60: difference 0). */
+VORCAL_API extern const uint8_t bookscl0OnlyParsing[60];
+VORCAL_API extern const uint8_t bookscl1OnlyParsing[3];
+VORCAL_API extern const uint8_t bookscl2OnlyParsing[5];
+VORCAL_API extern const uint8_t bookscl3OnlyParsing[4];
+VORCAL_API extern const uint8_t bookscl4OnlyParsing[6];
+VORCAL_API extern const uint8_t bookscl5OnlyParsing[6];
+VORCAL_API extern const uint8_t bookscl6OnlyParsing[6];
+VORCAL_API extern const uint8_t bookscl7OnlyParsing[5];
+VORCAL_API extern const uint8_t bookscl8OnlyParsing[8];
+VORCAL_API extern const uint8_t bookscl9OnlyParsing[4];
+VORCAL_API extern const uint8_t bookscl10OnlyParsing[7];
+VORCAL_API extern const uint8_t bookscl11OnlyParsing[3];
+VORCAL_API extern const uint8_t bookscl12OnlyParsing[7];
+VORCAL_API extern const uint8_t bookscl13OnlyParsing[46];
+VORCAL_API extern const uint8_t *const booksclOnlyParsing[14];
+VORCAL_API extern const uint32_t CBsize_sclOnlyParsing[14];
+VORCAL_API extern const uint32_t MaxVal_sclOnlyParsing[14];
+/* Sign bit (0x2, 0x4, 0x8) and sign extension (0xFFFC, 0xFFF8, 0xFFF0) of a TNS coefficient of
+ * 2, 3 or 4 bits. */
+VORCAL_API extern const uint8_t sgn_maskOnlyParsing[3];
+VORCAL_API extern const uint16_t neg_maskOnlyParsing[3];
+/* Prediction bands (pred_max_bands) per sampling_frequency_index 0-11. */
+VORCAL_API extern const uint32_t VrTBL_pred_max_bands_OnlyParsing[12];
+
+/* single_channel_element(): 0; 3 no channel for its tag; 4 the channel stream failed. */
+VORCAL_API uint32_t single_channel_elementOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrMCInfo_OnlyParsing *pMap);
+/* channel_pair_element(): 0; 5 no channel for its tag; 6 ics_info failed; 7 or 8 the first or
+ * the second channel stream failed. */
+VORCAL_API uint32_t channel_pair_elementOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrMCInfo_OnlyParsing *pMap);
+/* lfe_channel_element(): 1 on success (unlike the others); 0xFFFFFFFF (-1) no channel or the
+ * channel stream failed. */
+VORCAL_API uint32_t lfe_channel_elementOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrMCInfo_OnlyParsing *pMap);
+/* individual_channel_stream() of channel uChannel: 1, or 0 (no band information, section error,
+ * bad scale factor, pulse data in a short window, gain control data). */
+VORCAL_API uint32_t geticsOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrICS_OnlyParsing *pICS, uint32_t uCommonWindow,
+                                      uint32_t uChannel, uint32_t uFirstChannel, uint32_t uWindowInfoChannel);
+/* ics_info(): 1, or 0 when the window sequence has no band information. */
+VORCAL_API uint32_t get_ics_infoOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrICS_OnlyParsing *pICS, uint32_t uChannel,
+                                            uint32_t uWindowInfoChannel, uint32_t uCommonWindow);
+/* section_data(); a section error (sections beyond max_sfb or the band count, or more than 129
+ * sections) leaves the section count 0. Returns 0. */
+VORCAL_API uint32_t section_dataOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrICS_OnlyParsing *pICS, uint32_t uChannel,
+                                            uint32_t uWindowInfoChannel);
+/* scale_factor_data(): 1, or 0 for a reserved codebook (12) or a scale factor outside 0-255. */
+VORCAL_API uint32_t scale_factor_dataOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrICS_OnlyParsing *pICS,
+                                                 uint32_t uChannel, uint32_t uGlobalGain);
+/* spectral_data(), then the pulses of pulse_data when present. Returns 1. */
+VORCAL_API uint32_t spectral_dataOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrICS_OnlyParsing *pICS, uint32_t uChannel,
+                                             uint32_t uFirstChannel);
+/* ms_mask_present and the M/S mask; returns ms_mask_present. */
+VORCAL_API uint32_t getmaskOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrICS_OnlyParsing *pICS, uint32_t uChannel);
+/* pulse_data(); returns the last value read (the last pulse_amp). */
+VORCAL_API uint32_t get_pulse_ncOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrPulseInfo_OnlyParsing *pPulse);
+/* Adds the pulses to the stored spectral values of a channel. Returns 0. */
+VORCAL_API uint32_t pulse_ncOnlyParsing(VrAACDecoder_OnlyParsing *pDec, uint32_t uChannel, const VrPulseInfo_OnlyParsing *pPulse);
+/* tns_data(). Returns 1. */
+VORCAL_API uint32_t get_tnsOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrICS_OnlyParsing *pICS, VrTNSInfo_OnlyParsing *pTNS);
+/* No TNS filter in any window. Returns 0. */
+VORCAL_API uint32_t clr_tnsOnlyParsing(VrICS_OnlyParsing *pICS, VrTNSInfo_OnlyParsing *pTNS);
+/* For a value of +-16, reads an escape sequence and returns 2^(N+4) plus the N + 4 bits after
+ * N leading ones, with the sign of iValue (as a signed value in the unsigned code); other
+ * values come back unchanged. Any number of leading ones is read. */
+VORCAL_API uint32_t getescapeOnlyParsing(VrAACDecoder_OnlyParsing *pDec, int32_t iValue);
+/* fill_element(): the fill data of each payload goes to pBuffer (at most 268 bytes); returns
+ * the last payload result. */
+VORCAL_API uint32_t getfillOnlyParsing(VrAACDecoder_OnlyParsing *pDec, uint8_t *pBuffer);
+/* One extension_payload() of uCount bytes: fill data (type 1) to pBuffer (uCount - 1 bytes, at
+ * most 268), any other type skipped. Returns uCount. */
+VORCAL_API uint32_t extension_payloadOnlyParsing(VrAACDecoder_OnlyParsing *pDec, uint32_t uCount, uint8_t *pBuffer);
+/* data_stream_element(): tag and byte count out, the bytes to pBuffer (at most 510); returns
+ * the last byte read (the last data byte, else the last count byte). */
+VORCAL_API uint32_t getdataOnlyParsing(VrAACDecoder_OnlyParsing *pDec, uint32_t *puTag, uint32_t *puCount, uint8_t *pBuffer);
+/* VrTBL_pred_max_bands_OnlyParsing at the current sampling_frequency_index (0 for 12-15). */
+VORCAL_API uint32_t pred_max_bandsOnlyParsing(VrAACDecoder_OnlyParsing *pDec);
+
+/* ------------------------------------------------------------------------------------------
+ * Whole-frame parser.
+ *
+ * Walks every raw data block of a frame to its ID_END on a parser's own state (never
+ * hhDecoder), so parsers on different threads never meet. Each parser is allocated once
+ * through the system layer and a parse allocates nothing. The frame is read through a padded
+ * copy: no byte outside the caller's frame is touched. SBR payloads in fill elements go to the
+ * SBR parser with the parser's own SBR state (headers persist across frames); what it finds
+ * counts while a valid SBR header is in force. The fill element's count decides where the walk
+ * resumes.
+ * ---------------------------------------------------------------------------------------- */
+
+typedef struct CALAACParser CALAACParser; /* opaque: one decoder state record and a padded frame buffer */
+
+typedef struct CALAACFrameInfo {
+    uint32_t uSampleRate;      /* core sampling rate in Hz */
+    uint32_t uChannels;        /* core channels (channel_configuration, or the AudioSpecificConfig's) */
+    uint32_t uOutSampleRate;   /* uSampleRate * 2 when SBR was found, else uSampleRate */
+    uint32_t uOutChannels;     /* 2 when parametric stereo was found, else uChannels */
+    uint32_t uSBR;             /* 1: an SBR extension payload (type 13 or 14) with a valid SBR header in force */
+    uint32_t uPS;              /* 1: SBR extended data carried parametric stereo (extension id 2) */
+    uint32_t uFrameBytes;      /* bytes of the frame: aac_frame_length for ADTS, else the length passed */
+    uint32_t uBits;            /* bits read from the first byte of the frame through the last ID_END */
+    uint32_t auElements[8];    /* how many elements of each id_syn_ele (0 SCE ... 7 END) the frame held */
+} CALAACFrameInfo;
+
+/* Results of vorCALTools_AAC_ParseFrame. */
+#define CAL_AAC_PARSE_OK 0          /* parsed to ID_END, ending exactly at the end of the frame */
+#define CAL_AAC_PARSE_BAD_INPUT 1   /* bad arguments, no ADTS sync word, or an AudioSpecificConfig it cannot use */
+#define CAL_AAC_PARSE_SHORT 2       /* the frame is shorter than its header says */
+#define CAL_AAC_PARSE_REFUSED 3     /* an element was refused (see below) */
+#define CAL_AAC_PARSE_OVERRUN 4     /* the syntax runs past the end of the frame */
+#define CAL_AAC_PARSE_LEFTOVER 5    /* ID_END came before the end of the frame */
+
+/* pASC null: frames are ADTS. Otherwise frames are raw access units described by this
+ * AudioSpecificConfig (object type 1 or 2 with 1024-sample frames, also behind object type 5
+ * or 29 or the 0x2B7 / 0x548 sync extensions, which signal SBR and parametric stereo before
+ * any frame; an AudioSpecificConfig it cannot read makes every parse return
+ * CAL_AAC_PARSE_BAD_INPUT). Null when the memory table fails. */
+VORCAL_API CALAACParser *vorCALTools_AAC_CreateParser(const uint8_t *pASC, int32_t iASCLen);
+/* Parses one frame (ADTS: aac_frame_length bytes from pFrame, which may hold more; otherwise
+ * one access unit of iLen bytes, at most 8191) and fills *pInfo as far as the parse got.
+ * Result CAL_AAC_PARSE_*; refused (3) are an unknown tag, a channel layout the channel map
+ * refuses, a section error, pulse data in a short window, gain control data, and a coupling
+ * channel element (which has no parser). */
+VORCAL_API int32_t vorCALTools_AAC_ParseFrame(CALAACParser *hParser, const uint8_t *pFrame, int32_t iLen,
+                                              CALAACFrameInfo *pInfo);
+/* Frees a parser (null is ignored). */
+VORCAL_API void vorCALTools_AAC_DestroyParser(CALAACParser *hParser);
 
 /* ------------------------------------------------------------------------------------------
  * SBR extension parsing.

@@ -45,6 +45,11 @@ int32_t LengthToAnnexB(uint8_t *pDst, int64_t iDstSize, const uint8_t *pSrc, int
         return -1;
     if (iSrcLen <= iSize)
         return 0;
+    // With 4-byte fields every unit keeps its place: one copy of as much as the destination
+    // holds, then the walk turns each field into a start code.
+    const bool bInPlace = iSize == 4;
+    if (bInPlace)
+        memcpy(pDst, pSrc, static_cast<size_t>(iSrcLen < iDstSize ? iSrcLen : iDstSize));
     int64_t iRemaining = iSrcLen;
     int64_t iPos = 0;
     int64_t iWritten = 0;
@@ -60,7 +65,8 @@ int32_t LengthToAnnexB(uint8_t *pDst, int64_t iDstSize, const uint8_t *pSrc, int
         if (iWritten + 4 + uUnit > iDstSize)
             return -1;
         memcpy(pDst + iWritten, kStartCode, 4);
-        memcpy(pDst + iWritten + 4, pSrc + iPos, uUnit);
+        if (!bInPlace)
+            memcpy(pDst + iWritten + 4, pSrc + iPos, uUnit);
         iWritten += 4 + int64_t{uUnit};
         iPos += uUnit;
         iRemaining -= uUnit;

@@ -1,0 +1,155 @@
+// Chooses the start-code variant once, on first use: the widest one the CPU runs. The checks
+// add no import to the library: on x86-64 the compiler's CPU builtins (linked statically), on
+// 32-bit ARM Linux the auxiliary vector read with plain system calls.
+#include <atomic>
+#include <cstddef>
+#include <cstdint>
+
+#include "tools/scan/variants.hpp"
+#include "tools/start_code.hpp"
+
+namespace vorcal::tools {
+
+namespace {
+
+bool Always() noexcept
+{
+    return true;
+}
+
+#if defined(__x86_64__)
+// The builtins also check that the operating system saves the AVX and AVX-512 register state.
+bool HasAvx2() noexcept
+{
+    __builtin_cpu_init();
+    return __builtin_cpu_supports("avx2") && __builtin_cpu_supports("bmi") && __builtin_cpu_supports("bmi2");
+}
+
+bool HasAvx512bw() noexcept
+{
+    __builtin_cpu_init();
+    return __builtin_cpu_supports("avx512f") && __builtin_cpu_supports("avx512bw") && HasAvx2();
+}
+
+bool HasAvx512Vbmi() noexcept
+{
+    return HasAvx512bw() && __builtin_cpu_supports("avx512vbmi");
+}
+#endif
+
+#if defined(__arm__) && !defined(__ARM_NEON) && defined(__linux__)
+// Linux system calls through the kernel's interface alone, so that the C library is not asked.
+long Syscall3(long lNumber, long a, long b, long c) noexcept
+{
+    register long r0 __asm__("r0") = a;
+    register long r1 __asm__("r1") = b;
+    register long r2 __asm__("r2") = c;
+    // The call number goes in r7, which Thumb code may use as its frame pointer: saved around.
+    __asm__ volatile("push {r7}\n\tmov r7, %1\n\tsvc #0\n\tpop {r7}"
+                     : "+r"(r0)
+                     : "r"(lNumber), "r"(r1), "r"(r2)
+                     : "memory");
+    return r0;
+}
+
+// AT_HWCAP of /proc/self/auxv has HWCAP_NEON set.
+bool HasNeon() noexcept
+{
+    constexpr long kRead = 3, kOpen = 5, kClose = 6; // ARM EABI system call numbers
+    constexpr uint32_t kAtNull = 0, kAtHwcap = 16, kHwcapNeon = 1u << 12;
+    const long lFile = Syscall3(kOpen, reinterpret_cast<long>("/proc/self/auxv"), 0 /* O_RDONLY */, 0);
+    if (lFile < 0)
+        return false;
+    bool bNeon = false;
+    uint32_t auEntry[2];
+    while (Syscall3(kRead, lFile, reinterpret_cast<long>(auEntry), sizeof auEntry) == sizeof auEntry &&
+           auEntry[0] != kAtNull) {
+        if (auEntry[0] == kAtHwcap) {
+            bNeon = (auEntry[1] & kHwcapNeon) != 0;
+            break;
+        }
+    }
+    Syscall3(kClose, lFile, 0, 0);
+    return bNeon;
+}
+#elif defined(__aarch64__) || defined(__arm__)
+// AArch64 always has NEON; a 32-bit target built for NEON assumes it; elsewhere it is not asked.
+bool HasNeon() noexcept
+{
+#if defined(__aarch64__) || defined(__ARM_NEON)
+    return true;
+#else
+    return false;
+#endif
+}
+#endif
+
+constexpr StartCodeVariant kVariants[] = {
+    {&scan::kPortableKernels, Always},
+#if defined(__x86_64__)
+    {&scan::kSse2Kernels, Always},
+    {&scan::kAvx2Kernels, HasAvx2},
+    {&scan::kAvx512Kernels, HasAvx512bw},
+    {&scan::kAvx512VbmiKernels, HasAvx512Vbmi},
+#endif
+#if defined(__aarch64__) || defined(__arm__)
+    {&scan::kNeonKernels, HasNeon},
+#endif
+};
+
+const StartCodeKernels *Widest() noexcept
+{
+    for (size_t i = std::size(kVariants); i-- > 1;) {
+        if (kVariants[i].pSupported())
+            return kVariants[i].pKernels;
+    }
+    return kVariants[0].pKernels;
+}
+
+// Threads that meet on first use choose the same variant; a relaxed store suffices.
+std::atomic<const StartCodeKernels *> g_pActive{nullptr};
+
+inline const StartCodeKernels &Active() noexcept
+{
+    const StartCodeKernels *p = g_pActive.load(std::memory_order_relaxed);
+    if (p == nullptr) {
+        p = Widest();
+        g_pActive.store(p, std::memory_order_relaxed);
+    }
+    return *p;
+}
+
+} // namespace
+
+std::span<const StartCodeVariant> StartCodeVariants() noexcept
+{
+    return kVariants;
+}
+
+const StartCodeKernels &ActiveStartCodeKernels() noexcept
+{
+    return Active();
+}
+
+void UseStartCodeKernels(const StartCodeKernels *pKernels) noexcept
+{
+    g_pActive.store(pKernels != nullptr ? pKernels : Widest(), std::memory_order_relaxed);
+}
+
+size_t FindStartCodePrefix(const uint8_t *pData, size_t uFrom, size_t uEnd) noexcept
+{
+    return Active().pFind(pData, uFrom, uEnd);
+}
+
+size_t FindStartCodePrefixCopy(const uint8_t *pData, size_t uFrom, size_t uEnd, uint8_t *pDst,
+                               size_t uDstRoom) noexcept
+{
+    return Active().pFindCopy(pData, uFrom, uEnd, pDst, uDstRoom);
+}
+
+void CopyBytes(uint8_t *pDst, const uint8_t *pSrc, size_t uLen) noexcept
+{
+    Active().pCopy(pDst, pSrc, uLen);
+}
+
+} // namespace vorcal::tools

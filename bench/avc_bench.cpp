@@ -246,7 +246,7 @@ void RatioTable(int rounds)
         }
     }
     vorcal::bench::RunRounds(cases, rounds);
-    vorcal::bench::PrintRounds(cases, "vorCALTools_AVC_ConvertFormat against memcpy of the same frames", "memcpy GB/s");
+    vorcal::bench::PrintRounds(cases, "vorCALTools_AVC_ConvertFormat", "memcpy of the same frames");
     std::printf("\n");
 }
 

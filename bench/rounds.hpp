@@ -71,28 +71,32 @@ inline void RunRounds(std::vector<RoundCase> &cases, int rounds)
     }
 }
 
-// One line per case: ns per frame and GB/s of the subject, GB/s of the baseline, and the
+// One line per case: ns per frame of the subject and of the baseline, GB/s of both, and the
 // speed against the baseline (baseline time / subject time) per round.
 inline void PrintRounds(const std::vector<RoundCase> &cases, const char *pTitle, const char *pBaseline)
 {
-    std::printf("\n%s: %zu rounds, medians [min, max]\n", pTitle, cases.empty() ? size_t{0} : cases[0].subjectSeconds.size());
-    std::printf("%-46s %20s %26s %26s %26s\n", "case", "ns/frame", "GB/s", pBaseline, "speed vs baseline");
+    std::printf("\n%s: %zu rounds, medians [min, max]; baseline: %s\n", pTitle,
+                cases.empty() ? size_t{0} : cases[0].subjectSeconds.size(), pBaseline);
+    std::printf("%-46s %22s %22s %22s %22s %22s\n", "case", "ns/frame", "baseline ns/frame", "GB/s", "baseline GB/s",
+                "speed vs baseline");
     for (const RoundCase &c : cases) {
-        std::vector<double> perFrame, rate, baseRate, speed;
+        std::vector<double> perFrame, basePerFrame, rate, baseRate, speed;
         for (size_t i = 0; i < c.subjectSeconds.size(); ++i) {
             perFrame.push_back(c.subjectSeconds[i] * 1e9 / c.items);
+            basePerFrame.push_back(c.baselineSeconds[i] * 1e9 / c.items);
             rate.push_back(c.bytes / c.subjectSeconds[i] / 1e9);
             baseRate.push_back(c.bytes / c.baselineSeconds[i] / 1e9);
             speed.push_back(c.baselineSeconds[i] / c.subjectSeconds[i]);
         }
-        auto Cell = [](const Spread &s, const char *pFormat) {
+        auto Cell = [](const std::vector<double> &v, const char *pFormat) {
+            const Spread s = SpreadOf(v);
             char buf[64];
             std::snprintf(buf, sizeof buf, pFormat, s.median, s.min, s.max);
             return std::string(buf);
         };
-        std::printf("%-46s %20s %26s %26s %26s\n", c.name.c_str(), Cell(SpreadOf(perFrame), "%.1f [%.1f, %.1f]").c_str(),
-                    Cell(SpreadOf(rate), "%.2f [%.2f, %.2f]").c_str(), Cell(SpreadOf(baseRate), "%.2f [%.2f, %.2f]").c_str(),
-                    Cell(SpreadOf(speed), "%.3f [%.3f, %.3f]").c_str());
+        std::printf("%-46s %22s %22s %22s %22s %22s\n", c.name.c_str(), Cell(perFrame, "%.1f [%.1f, %.1f]").c_str(),
+                    Cell(basePerFrame, "%.1f [%.1f, %.1f]").c_str(), Cell(rate, "%.1f [%.1f, %.1f]").c_str(),
+                    Cell(baseRate, "%.1f [%.1f, %.1f]").c_str(), Cell(speed, "%.3f [%.3f, %.3f]").c_str());
     }
     std::fflush(stdout);
 }

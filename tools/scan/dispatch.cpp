@@ -1,6 +1,6 @@
 // Chooses the start-code variant once, on first use: the widest one the CPU runs. The checks
-// add no import to the library: on x86-64 the compiler's CPU builtins (linked statically), on
-// 32-bit ARM Linux the auxiliary vector read with plain system calls.
+// add no import to the library: on x86-64 the compiler's CPU builtins (cpuid, linked
+// statically); on ARM what the target assumes.
 #include <atomic>
 #include <cstddef>
 #include <cstdint>
@@ -37,43 +37,9 @@ bool HasAvx512Vbmi() noexcept
 }
 #endif
 
-#if defined(__arm__) && !defined(__ARM_NEON) && defined(__linux__)
-// Linux system calls through the kernel's interface alone, so that the C library is not asked.
-long Syscall3(long lNumber, long a, long b, long c) noexcept
-{
-    register long r0 __asm__("r0") = a;
-    register long r1 __asm__("r1") = b;
-    register long r2 __asm__("r2") = c;
-    // The call number goes in r7, which Thumb code may use as its frame pointer: saved around.
-    __asm__ volatile("push {r7}\n\tmov r7, %1\n\tsvc #0\n\tpop {r7}"
-                     : "+r"(r0)
-                     : "r"(lNumber), "r"(r1), "r"(r2)
-                     : "memory");
-    return r0;
-}
-
-// AT_HWCAP of /proc/self/auxv has HWCAP_NEON set.
-bool HasNeon() noexcept
-{
-    constexpr long kRead = 3, kOpen = 5, kClose = 6; // ARM EABI system call numbers
-    constexpr uint32_t kAtNull = 0, kAtHwcap = 16, kHwcapNeon = 1u << 12;
-    const long lFile = Syscall3(kOpen, reinterpret_cast<long>("/proc/self/auxv"), 0 /* O_RDONLY */, 0);
-    if (lFile < 0)
-        return false;
-    bool bNeon = false;
-    uint32_t auEntry[2];
-    while (Syscall3(kRead, lFile, reinterpret_cast<long>(auEntry), sizeof auEntry) == sizeof auEntry &&
-           auEntry[0] != kAtNull) {
-        if (auEntry[0] == kAtHwcap) {
-            bNeon = (auEntry[1] & kHwcapNeon) != 0;
-            break;
-        }
-    }
-    Syscall3(kClose, lFile, 0, 0);
-    return bNeon;
-}
-#elif defined(__aarch64__) || defined(__arm__)
-// AArch64 always has NEON; a 32-bit target built for NEON assumes it; elsewhere it is not asked.
+#if defined(__aarch64__) || defined(__arm__)
+// The library asks the operating system nothing: NEON is used where the target assumes it (every
+// AArch64 target, 32-bit targets built for NEON such as Android's armeabi-v7a).
 bool HasNeon() noexcept
 {
 #if defined(__aarch64__) || defined(__ARM_NEON)

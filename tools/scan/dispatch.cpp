@@ -75,14 +75,18 @@ const StartCodeKernels *Widest() noexcept
 // Threads that meet on first use choose the same variant; a relaxed store suffices.
 std::atomic<const StartCodeKernels *> g_pActive{nullptr};
 
+// The first use, kept out of line so that the calls below stay a load and a jump.
+[[gnu::noinline]] const StartCodeKernels &Choose() noexcept
+{
+    const StartCodeKernels *p = Widest();
+    g_pActive.store(p, std::memory_order_relaxed);
+    return *p;
+}
+
 inline const StartCodeKernels &Active() noexcept
 {
     const StartCodeKernels *p = g_pActive.load(std::memory_order_relaxed);
-    if (p == nullptr) {
-        p = Widest();
-        g_pActive.store(p, std::memory_order_relaxed);
-    }
-    return *p;
+    return p != nullptr ? *p : Choose();
 }
 
 } // namespace

@@ -1,7 +1,7 @@
 // Every start-code variant this CPU runs against a byte-by-byte reference: the search from the
-// start the input chooses, the copying search into a destination of exactly the room it
-// chooses (so that a write past the room is caught), and the plain copy. The data is a buffer
-// of its own exact size, so that a read past its end is caught too.
+// start the input chooses, and the copying search into a destination of exactly the room it
+// chooses (so that a write past the room is caught). The data is a buffer of its own exact
+// size, so that a read past its end is caught too.
 // Input: start selector, room cut, then the data.
 #include <algorithm>
 #include <cstdint>
@@ -42,9 +42,6 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *pData, size_t uSize)
         CHECK(FindStartCodePrefixCopy(d.data(), from, n, dst.data(), room) == ref);
         CHECK(std::equal(d.begin() + std::ptrdiff_t(from), d.begin() + std::ptrdiff_t(from + std::min(ref - from, room)),
                          dst.begin()));
-        std::vector<uint8_t> copy(n);
-        CopyBytes(copy.data(), d.data(), n);
-        CHECK(copy == d);
     }
     UseStartCodeKernels(nullptr);
     return 0;

@@ -19,15 +19,11 @@ size_t FindStartCodePrefix(const uint8_t *pData, size_t uFrom, size_t uEnd) noex
 size_t FindStartCodePrefixCopy(const uint8_t *pData, size_t uFrom, size_t uEnd, uint8_t *pDst,
                                size_t uDstRoom) noexcept;
 
-// Copies uLen bytes (the buffers do not overlap) with the widest loads and stores of the CPU.
-void CopyBytes(uint8_t *pDst, const uint8_t *pSrc, size_t uLen) noexcept;
-
-// One variant: the three operations above for one instruction set.
+// One variant: the two operations above for one instruction set.
 struct StartCodeKernels {
     const char *pName;
     size_t (*pFind)(const uint8_t *pData, size_t uFrom, size_t uEnd) noexcept;
     size_t (*pFindCopy)(const uint8_t *pData, size_t uFrom, size_t uEnd, uint8_t *pDst, size_t uDstRoom) noexcept;
-    void (*pCopy)(uint8_t *pDst, const uint8_t *pSrc, size_t uLen) noexcept;
 };
 
 struct StartCodeVariant {

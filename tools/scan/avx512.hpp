@@ -101,18 +101,12 @@ struct Avx512 {
         }
         return kBytes;
     }
-    // Whole vectors, then one masked load and store.
+    // One masked load and store.
     static void CopyTail(uint8_t *d, const uint8_t *s, size_t n) noexcept
     {
-        size_t i = 0;
-        for (; i + 64 <= n; i += 64)
-            Copy64(d + i, s + i);
-        if (i < n) {
-            const uint64_t k = LowBits(n - i);
-            _mm512_mask_storeu_epi8(d + i, k, _mm512_maskz_loadu_epi8(k, s + i));
-        }
+        const uint64_t k = n >= 64 ? ~uint64_t{0} : LowBits(n);
+        _mm512_mask_storeu_epi8(d, k, _mm512_maskz_loadu_epi8(k, s));
     }
-    static void Copy64(uint8_t *d, const uint8_t *s) noexcept { _mm512_storeu_si512(d, Load(s)); }
 };
 
 } // namespace

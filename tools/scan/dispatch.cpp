@@ -117,9 +117,4 @@ size_t FindStartCodePrefixCopy(const uint8_t *pData, size_t uFrom, size_t uEnd, 
     return Active().pFindCopy(pData, uFrom, uEnd, pDst, uDstRoom);
 }
 
-void CopyBytes(uint8_t *pDst, const uint8_t *pSrc, size_t uLen) noexcept
-{
-    Active().pCopy(pDst, pSrc, uLen);
-}
-
 } // namespace vorcal::tools

@@ -1,4 +1,4 @@
-// The start-code search, its fused copy and the plain copy, written once over an instruction-set
+// The start-code search and its fused copy, written once over an instruction-set
 // layer T and instantiated by each variant's translation unit (tools/scan/scan_*.cpp), which is
 // compiled for that instruction set. Everything here has internal linkage, so that the linker
 // can never pick a copy compiled for a wider set for code that runs on a narrower one.
@@ -33,13 +33,13 @@ namespace {
 //                        begins at one of them; reads one byte more (the pair's second byte)
 //   FirstPair<k>(s)      the offset of the first zero pair beginning in the k bytes at s, when
 //                        CopyScreen saw one; reads one byte more
-//   CopyTail(d, s, n)    copies n < 256 bytes
-//   Copy64(d, s)         copies 64 bytes
+//   CopyTail(d, s, n)    copies n <= 64 bytes
 
 constexpr size_t kNone = SIZE_MAX;
 
-// Prefetch distance of the loops over whole strides and blocks: the hardware prefetcher alone
-// leaves them waiting on the outer caches; 2 KB ahead keeps enough lines in flight.
+// Prefetch distance of the strided search: the hardware prefetcher alone leaves it waiting on
+// the outer caches; 2 KB ahead keeps enough lines in flight. The fused copy, which stores as
+// much as it loads, runs faster without (streamed and cache-hot alike).
 constexpr size_t kPrefetch = 2048;
 
 inline bool PrefixAt(const uint8_t *p) noexcept
@@ -261,25 +261,11 @@ inline size_t FirstPairByBytes(const uint8_t *s, size_t uBytes) noexcept
     return uBytes;
 }
 
-// CopyBytes: 256 bytes at a time, then the tail.
-template <class T>
-void Copy(uint8_t *pDst, const uint8_t *pSrc, size_t uLen) noexcept
-{
-    size_t i = 0;
-    for (; i + 256 <= uLen; i += 256) {
-        T::Copy64(pDst + i, pSrc + i);
-        T::Copy64(pDst + i + 64, pSrc + i + 64);
-        T::Copy64(pDst + i + 128, pSrc + i + 128);
-        T::Copy64(pDst + i + 192, pSrc + i + 192);
-    }
-    T::CopyTail(pDst + i, pSrc + i, uLen - i);
-}
-
 // The variant's table entry.
 template <class T>
 constexpr StartCodeKernels KernelsOf(const char *pName) noexcept
 {
-    return {pName, &Find<T>, &FindCopy<T>, &Copy<T>};
+    return {pName, &Find<T>, &FindCopy<T>};
 }
 
 // Copies n bytes with accesses of kVec bytes (the last one overlapping), or of the next

@@ -72,12 +72,6 @@ struct Avx2 {
         return kBytes;
     }
     static void CopyTail(uint8_t *d, const uint8_t *s, size_t n) noexcept { CopyShort<32>(d, s, n); }
-    static void Copy64(uint8_t *d, const uint8_t *s) noexcept
-    {
-        const Vec a = Load(s), b = Load(s + 32);
-        _mm256_storeu_si256(reinterpret_cast<Vec *>(d), a);
-        _mm256_storeu_si256(reinterpret_cast<Vec *>(d + 32), b);
-    }
 };
 
 } // namespace

@@ -64,11 +64,6 @@ struct Neon {
         return kBytes;
     }
     static void CopyTail(uint8_t *d, const uint8_t *s, size_t n) noexcept { CopyShort<16>(d, s, n); }
-    static void Copy64(uint8_t *d, const uint8_t *s) noexcept
-    {
-        for (size_t k = 0; k < 64; k += 16)
-            vst1q_u8(d + k, vld1q_u8(s + k));
-    }
 };
 
 } // namespace

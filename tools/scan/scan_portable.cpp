@@ -61,7 +61,6 @@ struct Portable {
         return FirstPairByBytes(s, kBytes);
     }
     static void CopyTail(uint8_t *d, const uint8_t *s, size_t n) noexcept { CopyShort<8>(d, s, n); }
-    static void Copy64(uint8_t *d, const uint8_t *s) noexcept { memcpy(d, s, 64); }
 };
 
 } // namespace

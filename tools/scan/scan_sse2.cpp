@@ -68,11 +68,6 @@ struct Sse2 {
         return kBytes;
     }
     static void CopyTail(uint8_t *d, const uint8_t *s, size_t n) noexcept { CopyShort<16>(d, s, n); }
-    static void Copy64(uint8_t *d, const uint8_t *s) noexcept
-    {
-        for (size_t k = 0; k < 64; k += 16)
-            _mm_storeu_si128(reinterpret_cast<Vec *>(d + k), Load(s + k));
-    }
 };
 
 } // namespace

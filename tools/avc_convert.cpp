@@ -48,7 +48,7 @@ int32_t LengthToAnnexB(uint8_t *pDst, int64_t iDstSize, const uint8_t *pSrc, int
     // With 4-byte fields every unit keeps its place: one copy of as much as the destination
     // holds, then the walk turns each field into a start code.
     const bool bInPlace = iSize == 4;
-    if (bInPlace)
+    if (bInPlace && iDstSize > 0)
         memcpy(pDst, pSrc, static_cast<size_t>(iSrcLen < iDstSize ? iSrcLen : iDstSize));
     int64_t iRemaining = iSrcLen;
     int64_t iPos = 0;

@@ -40,8 +40,8 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *pData, size_t uSize)
         CHECK(FindStartCodePrefix(d.data(), from, n) == ref);
         std::vector<uint8_t> dst(room);
         CHECK(FindStartCodePrefixCopy(d.data(), from, n, dst.data(), room) == ref);
-        CHECK(std::equal(d.begin() + std::ptrdiff_t(from), d.begin() + std::ptrdiff_t(from + std::min(ref - from, room)),
-                         dst.begin()));
+        const auto first = d.begin() + std::ptrdiff_t(from);
+        CHECK(std::equal(first, first + std::ptrdiff_t(std::min(ref - from, room)), dst.begin()));
     }
     UseStartCodeKernels(nullptr);
     return 0;

@@ -1,8 +1,8 @@
-// Every start-code variant built for this target (portable, SSE2, AVX2, AVX-512BW or NEON),
-// forced in turn, against a byte-by-byte reference: random data with dense and sparse zero
-// bytes and planted prefixes, every start and end offset of a 64-byte block with the data
-// ending at an inaccessible page, kilobyte frames across block and prefetch edges, and the
-// H.264 fixtures. The variants come from the internal object library (the layer's are hidden).
+// Every start-code variant built for this target (portable, SSE2, AVX2, AVX-512BW, AVX-512VBMI
+// or NEON), forced in turn, against a byte-by-byte reference: random data with dense and sparse
+// zero bytes and planted prefixes, every start and end offset of a 64-byte block with the data
+// ending at an inaccessible page, kilobyte frames across block and group edges, and the H.264
+// fixtures. The variants come from the internal object library (the layer's are hidden).
 #include <gtest/gtest.h>
 #include <sys/mman.h>
 #include <unistd.h>
@@ -41,7 +41,8 @@ public:
     {
         const size_t page = static_cast<size_t>(sysconf(_SC_PAGESIZE));
         size_ = (b.size() + page - 1) / page * page + page;
-        base_ = static_cast<uint8_t *>(mmap(nullptr, size_, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0));
+        base_ = static_cast<uint8_t *>(
+            mmap(nullptr, size_, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0));
         mprotect(base_ + size_ - page, page, PROT_NONE);
         data_ = base_ + size_ - page - b.size();
         std::copy(b.begin(), b.end(), data_);
@@ -154,7 +155,8 @@ TEST_P(StartCodeKernel, EveryStartAndEndOffsetOfABlock)
                     if (from >= len)
                         continue;
                     for (size_t room : {len - from, len - from - (len - from) % 64, size_t(rng() % (len - from + 1))})
-                        ASSERT_TRUE(MatchesReference(g.data(), from, len, room)) << len << " " << plant << " " << from << " " << room;
+                        ASSERT_TRUE(MatchesReference(g.data(), from, len, room))
+                            << len << " " << plant << " " << from << " " << room;
                 }
             }
         }

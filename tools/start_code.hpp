@@ -1,6 +1,7 @@
 // The one start-code search of the library: finds the prefix 00 00 01. Every tool that looks
 // for H.264, MPEG-4 Visual or MPEG-1/2 start codes is built on it. The work is done by one of
-// several variants (portable, SSE2, AVX2, AVX-512BW, NEON), chosen once at run time for the CPU.
+// several variants (portable, SSE2, AVX2, AVX-512BW, AVX-512VBMI, NEON), chosen once at run time
+// for the CPU.
 #pragma once
 
 #include <cstddef>

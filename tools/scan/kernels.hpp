@@ -59,7 +59,8 @@ inline typename T::Vec MinOfBlocks(const uint8_t *p) noexcept
     if constexpr (kCount == 1)
         return T::LoadAligned(p + kFirst * T::kBlock);
     else
-        return T::Min(MinOfBlocks<T, kFirst, kCount / 2>(p), MinOfBlocks<T, kFirst + kCount / 2, kCount - kCount / 2>(p));
+        return T::Min(MinOfBlocks<T, kFirst, kCount / 2>(p),
+                      MinOfBlocks<T, kFirst + kCount / 2, kCount - kCount / 2>(p));
 }
 
 // First candidate of the block at p that really begins a prefix, or kBlock. The block plus

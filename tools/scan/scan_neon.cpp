@@ -58,7 +58,8 @@ struct Neon {
     static size_t FirstPair(const uint8_t *s) noexcept
     {
         for (size_t b = 0; b < kBytes; b += 16) {
-            if (AnyNonZero(vreinterpretq_u8_u16(vceqq_u16(PairLanes(vld1q_u8(s + b), vld1q_u8(s + b + 1)), vdupq_n_u16(0)))))
+            const uint16x8_t lanes = PairLanes(vld1q_u8(s + b), vld1q_u8(s + b + 1));
+            if (AnyNonZero(vreinterpretq_u8_u16(vceqq_u16(lanes, vdupq_n_u16(0)))))
                 return b + FirstPairByBytes(s + b, 16);
         }
         return kBytes;

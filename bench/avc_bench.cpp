@@ -1,13 +1,23 @@
-// H.264 framing tools on a synthetic 1080p-like stream (bench/avc_stream.hpp), each against a
-// memcpy of the same frames in the same run.
+// H.264 framing tools against memcpy of the same frames in the same run. First a table of
+// interleaved rounds on streams made to the statistics of real 1080p x264 output
+// (bench/avc_stream.hpp): streamed (32 MB of frames, each converted to its own place in an
+// equally large destination, so both sides stream through memory) and cache-hot (the frames of
+// about 384 KB converted over and over), 1 and 8 slices a picture, 3- and 4-byte start codes.
+// Then the Google Benchmark cases on a smaller synthetic stream. Flags: --rounds=N (21),
+// --no-table, and Google Benchmark's own.
 #include <benchmark/benchmark.h>
 
+#include <cstdio>
+#include <cstdlib>
 #include <cstring>
+#include <memory>
+#include <string>
 #include <vector>
 
 #include <vorcal/video_tools.h>
 
 #include "avc_stream.hpp"
+#include "rounds.hpp"
 
 namespace {
 
@@ -127,4 +137,144 @@ BENCHMARK(BM_AnnexBConfigRun_Frames);
 BENCHMARK(BM_NalConfigRun_Frames);
 BENCHMARK(BM_AnnexBConfigRun_ScanToEnd);
 
+// Zero pairs outside start codes and escaped ones (00 00 03), per MB of the Annex B stream.
+void PrintStreamStatistics(const char *pName, const AvcStream &s)
+{
+    size_t pairs = 0, escaped = 0;
+    const std::vector<uint8_t> &b = s.annexB;
+    for (size_t i = 0; i + 2 < b.size(); ++i) {
+        if (b[i] == 0 && b[i + 1] == 0 && b[i + 2] != 1 && (i + 3 >= b.size() || b[i + 2] != 0 || b[i + 3] != 1)) {
+            ++pairs;
+            escaped += b[i + 2] == 3;
+            ++i;
+        }
+    }
+    const double mb = static_cast<double>(b.size()) / (1 << 20);
+    std::printf("%-28s %6.1f MB, %5zu frames of %5.1f KB on average, %6zu units, %5.1f zero pairs/MB (%4.1f escaped)\n",
+                pName, mb, s.annexBFrames.size(), static_cast<double>(b.size()) / 1024 / s.annexBFrames.size(), s.units,
+                pairs / mb, escaped / mb);
+}
+
+// The frames of one pass and where each one's output goes: its own place, 64-byte aligned like
+// a block of the default system layer, with the 100 bytes of headroom the decoder adaptation gives.
+struct Pass {
+    const uint8_t *pSource;
+    std::vector<AvcFrame> frames;
+    std::vector<size_t> out;
+    size_t bytes = 0;
+
+    Pass(const std::vector<uint8_t> &source, const std::vector<AvcFrame> &all, size_t first, size_t limit)
+        : pSource(source.data())
+    {
+        size_t o = 0;
+        for (size_t i = first; i < all.size() && bytes + all[i].size <= limit; ++i) {
+            frames.push_back(all[i]);
+            out.push_back(o);
+            o = (o + all[i].size + 100 + 63) / 64 * 64;
+            bytes += all[i].size;
+        }
+    }
+    size_t OutBytes() const { return out.empty() ? 0 : out.back() + frames.back().size + 100; }
+};
+
+struct Destination {
+    std::unique_ptr<uint8_t[]> block;
+    uint8_t *p = nullptr;
+    explicit Destination(size_t n) : block(new uint8_t[n + 64]), p(block.get() + (64 - reinterpret_cast<uintptr_t>(block.get()) % 64) % 64)
+    {
+        memset(p, 0, n);
+    }
+};
+
+void RatioTable(int rounds)
+{
+    struct Shape {
+        const char *pName;
+        int slices, code;
+        AvcStream stream;
+    };
+    std::vector<std::unique_ptr<Shape>> shapes;
+    for (int slices : {1, 8})
+        for (int code : {4, 3}) {
+            vorcal::bench::StreamShape shape;
+            shape.slices = slices;
+            shape.codeLength = code;
+            auto p = std::make_unique<Shape>(Shape{nullptr, slices, code, vorcal::bench::MakeCodedStream(shape)});
+            static const char *const kNames[2][2] = {{"1 slice, 4-byte codes", "1 slice, 3-byte codes"},
+                                                     {"8 slices, 4-byte codes", "8 slices, 3-byte codes"}};
+            p->pName = kNames[slices == 8][code == 3];
+            PrintStreamStatistics(p->pName, p->stream);
+            shapes.push_back(std::move(p));
+        }
+
+    constexpr size_t kStreamed = size_t{64} << 20, kHot = 384 << 10;
+    std::vector<std::unique_ptr<Pass>> passes;
+    std::vector<std::unique_ptr<Destination>> destinations;
+    std::vector<vorcal::bench::RoundCase> cases;
+    auto Add = [&](std::string name, const std::vector<uint8_t> &source, const std::vector<AvcFrame> &frames, bool hot) {
+        passes.push_back(std::make_unique<Pass>(source, frames, hot ? 1 : 0, hot ? kHot : kStreamed));
+        const Pass &pass = *passes.back();
+        destinations.push_back(std::make_unique<Destination>(pass.OutBytes()));
+        uint8_t *pDst = destinations.back()->p;
+        vorcal::bench::RoundCase c;
+        c.name = name + (hot ? ", hot" : ", streamed");
+        c.bytes = static_cast<double>(pass.bytes);
+        c.items = static_cast<double>(pass.frames.size());
+        c.passes = hot ? vorcal::bench::PassesFor(c.bytes) : 1;
+        c.subject = [&pass, pDst] {
+            for (size_t i = 0; i < pass.frames.size(); ++i) {
+                const auto n = static_cast<int32_t>(pass.frames[i].size);
+                benchmark::DoNotOptimize(vorCALTools_AVC_ConvertFormat(pDst + pass.out[i], n + 100,
+                                                                       pass.pSource + pass.frames[i].offset, n, 4));
+            }
+            benchmark::ClobberMemory();
+        };
+        c.baseline = [&pass, pDst] {
+            for (size_t i = 0; i < pass.frames.size(); ++i)
+                memcpy(pDst + pass.out[i], pass.pSource + pass.frames[i].offset, pass.frames[i].size);
+            benchmark::ClobberMemory();
+        };
+        cases.push_back(std::move(c));
+    };
+    for (bool hot : {false, true}) {
+        for (const auto &shape : shapes)
+            Add(std::string("Annex B -> lengths, ") + shape->pName, shape->stream.annexB, shape->stream.annexBFrames, hot);
+        for (const auto &shape : shapes) {
+            if (shape->code == 4)
+                Add(std::string("lengths -> Annex B, ") + (shape->slices == 1 ? "1 slice" : "8 slices"),
+                    shape->stream.lengthPrefixed, shape->stream.lengthFrames, hot);
+        }
+    }
+    vorcal::bench::RunRounds(cases, rounds);
+    vorcal::bench::PrintRounds(cases, "vorCALTools_AVC_ConvertFormat", "memcpy of the same frames");
+    std::printf("\n");
+}
+
 } // namespace
+
+int main(int argc, char **argv)
+{
+    benchmark::Initialize(&argc, argv);
+    int rounds = 21;
+    bool table = true;
+    for (int i = 1; i < argc; ++i) {
+        if (strncmp(argv[i], "--rounds=", 9) == 0 && atoi(argv[i] + 9) > 0) {
+            rounds = atoi(argv[i] + 9);
+        } else if (strcmp(argv[i], "--no-table") == 0) {
+            table = false;
+        } else {
+            std::fprintf(stderr, "avc_bench: unknown argument %s\n", argv[i]);
+            return 2;
+        }
+    }
+#if defined(__x86_64__)
+    __builtin_cpu_init();
+    std::printf("CPU: SSE2 yes, AVX2 %s, AVX-512BW %s\n", __builtin_cpu_supports("avx2") ? "yes" : "no",
+                __builtin_cpu_supports("avx512bw") ? "yes" : "no");
+#endif
+    if (table)
+        RatioTable(rounds);
+    benchmark::RunSpecifiedBenchmarks();
+    benchmark::Shutdown();
+    return 0;
+}

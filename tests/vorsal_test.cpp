@@ -79,6 +79,11 @@ TEST(DefaultSystemLayer, MemoryAndDumpFiles)
     void *p = layer.pMemory->Alloc(0); // a zero-byte request still gives a block
     EXPECT_NE(p, nullptr);
     layer.pMemory->Free(p);
+    for (uint32_t uSize : {1u, 17u, 100u, 30100u, 1u << 20}) { // every block starts a cache line
+        void *pBlock = layer.pMemory->Alloc(uSize);
+        EXPECT_EQ(reinterpret_cast<uintptr_t>(pBlock) % 64, 0u) << uSize;
+        layer.pMemory->Free(pBlock);
+    }
 
     const std::string path = vorcal::test::RecordingSal::Get().TempDir() + "/default.dump";
     EXPECT_EQ(layer.pFiles->Open(path.c_str(), 1), 0u); // only mode 6 is known

@@ -46,6 +46,13 @@ int64_t LengthToAnnexB(uint8_t *pDst, int64_t iDstSize, const uint8_t *pSrc, int
         return -1;
     if (iSrcLen <= iSize)
         return 0;
+    // With 4-byte fields every unit keeps its place: one copy of as much as the destination
+    // holds, then the walk turns each field into a start code.
+    const bool bInPlace = iSize == 4;
+    if constexpr (!kMeasure) {
+        if (bInPlace && iDstSize > 0)
+            memcpy(pDst, pSrc, static_cast<size_t>(iSrcLen < iDstSize ? iSrcLen : iDstSize));
+    }
     int64_t iRemaining = iSrcLen;
     int64_t iPos = 0;
     int64_t iWritten = 0;
@@ -63,7 +70,8 @@ int64_t LengthToAnnexB(uint8_t *pDst, int64_t iDstSize, const uint8_t *pSrc, int
             if (iWritten + 4 + uUnit > iDstSize)
                 return -1;
             memcpy(pDst + iWritten, kStartCode, 4);
-            memcpy(pDst + iWritten + 4, pSrc + iPos, uUnit);
+            if (!bInPlace)
+                memcpy(pDst + iWritten + 4, pSrc + iPos, uUnit);
         }
         iWritten += 4 + int64_t{uUnit};
         iPos += uUnit;

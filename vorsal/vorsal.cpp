@@ -1,4 +1,5 @@
-// The default system layer: memory from malloc, dump files through stdio, traces to stderr.
+// The default system layer: memory from the C library in 64-byte aligned blocks, dump files
+// through stdio, traces to stderr.
 //
 // VORSAL_TRACE chooses what vorSAL_TraceCat prints: "all", or a comma-separated list of
 // CATEGORY (every level) and CATEGORY:MAXLEVEL entries. Category 0 stands for the plain trace
@@ -71,9 +72,14 @@ void VPrint(int32_t iCategory, int32_t iLevel, const char *pFormat, va_list args
         std::fputc('\n', stderr);
 }
 
+// Blocks start on a 64-byte boundary (a cache line), so that the layer's H.264 conversions into
+// its intermediate buffer can store whole lines.
+constexpr size_t kBlockAlignment = 64;
+
 void *MemAlloc(uint32_t uSize)
 {
-    return std::malloc(uSize ? uSize : 1);
+    void *pBlock = nullptr;
+    return posix_memalign(&pBlock, kBlockAlignment, uSize ? uSize : 1) == 0 ? pBlock : nullptr;
 }
 
 void MemFree(void *pBlock)

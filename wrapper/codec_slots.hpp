@@ -31,11 +31,13 @@ inline int32_t CallSlot(const CALCodec *hCodec, Slot eSlot, Args... args) noexce
     return pFunction ? pFunction(args...) : -1;
 }
 
-// Video decoder: a property counts only when GetProperty returned 0 and the value matches.
+// Video decoder: a property counts only when GetProperty returned 0 and the value matches. The
+// instance's GetProperty slot is called directly, as vorCAL_VideoDecoderGetProperty would (the
+// adaptation asks on every frame).
 inline bool VideoPropertyAnswered(CALCodec *hCodec, uint32_t uProperty, uint32_t *puValue) noexcept
 {
     *puValue = 0;
-    return vorCAL_VideoDecoderGetProperty(hCodec, uProperty, puValue) == 0;
+    return CallSlot<CALGetPropertyFunc>(hCodec, kSlot0, uProperty, puValue) == 0;
 }
 
 inline bool VideoPropertyIs(CALCodec *hCodec, uint32_t uProperty, uint32_t uValue) noexcept

@@ -27,7 +27,9 @@ typedef uintptr_t CALParam;
 /* A file handle of the file table; 0 means no file. */
 typedef CALParam SALFile;
 
-/* g_vorSALMemoryTable: slot 0 allocates (null when no memory is left), slot 2 frees. */
+/* g_vorSALMemoryTable: slot 0 allocates (null when no memory is left), slot 2 frees. The H.264
+ * conversions of the video decoder write into a block of this table: blocks that start on a
+ * 64-byte boundary, as libvorsal.so returns them, let them store whole cache lines. */
 typedef struct SALMemoryTable {
     void *(*Alloc)(uint32_t uSize);
     void *pReserved1;

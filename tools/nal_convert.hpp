@@ -107,7 +107,7 @@ Converted StartCodesToLength(uint8_t *pDst, int64_t iDstSize, const uint8_t *pSr
     const uint64_t uMaxUnit = MaxUnitForField(iField);
     size_t uPos = 0;
     if (rules.bLeadingZeros) {
-        while (uPos + 3 < uLen && pSrc[uPos] == 0 && pSrc[uPos + 1] == 0 && pSrc[uPos + 2] == 0)
+        while (uPos + 3 < uLen && pSrc[uPos] == 0 && pSrc[uPos + 1] == 0 && pSrc[uPos + 2] == 0 && pSrc[uPos + 3] == 0)
             ++uPos;
     }
     int64_t iWritten = 0;

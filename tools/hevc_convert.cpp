@@ -153,6 +153,8 @@ int32_t FieldsOf(const Collected &c, RecordFields &f) noexcept
     for (size_t i = 0; i < c.uCount; ++i) {
         const UnitRef &k = c.units[i];
         if (k.uType == kNalSps) {
+            if (LayerId(k.p[0], k.p[1]) != 0)
+                continue; // the record describes the base layer, as vorCALTools_HEVC_ParseSPS does
             CALHEVCSPS sps;
             const int32_t r = ParseSpsUnit(k.p, k.uLen, sps);
             if (!bHaveSps && r != CAL_HEVC_OK)
@@ -184,6 +186,9 @@ int32_t FieldsOf(const Collected &c, RecordFields &f) noexcept
     }
     if (!bHaveSps)
         return CAL_HEVC_ERR_NOT_FOUND;
+    constexpr uint32_t kMaxRecordBitDepth = 15; // bitDepthLumaMinus8 and bitDepthChromaMinus8 have 3 bits
+    if (f.sps.uBitDepthLuma > kMaxRecordBitDepth || f.sps.uBitDepthChroma > kMaxRecordBitDepth)
+        return CAL_HEVC_ERR_MALFORMED;
     // parallelismType: 0 mixed or unknown (always when no spatial segmentation is promised),
     // 1 slices, 2 tiles, 3 wavefront.
     constexpr uint32_t kSlices = 1, kTiles = 2, kWavefront = 3;

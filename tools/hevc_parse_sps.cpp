@@ -107,6 +107,14 @@ struct ShortTermRps {
     int32_t iS0[kMaxDpbSize + 1] = {}, iS1[kMaxDpbSize + 1] = {};
 };
 
+// delta_poc_s0_minus1, delta_poc_s1_minus1 or abs_delta_rps_minus1, plus 1: a value out of range
+// marks the SPS malformed and counts as the largest, so that no sum can overflow.
+int32_t DeltaPoc(RbspReader &r) noexcept
+{
+    const uint32_t v = r.UE(kMaxDeltaPocMinus1);
+    return static_cast<int32_t>(v < kMaxDeltaPocMinus1 ? v : kMaxDeltaPocMinus1) + 1;
+}
+
 // st_ref_pic_set(stRpsIdx) in the SPS, where the reference set of inter prediction is always the
 // set before (delta_idx_minus1 is in slice headers only); the derivation of 7-61 and 7-62.
 void ReadShortTermRps(RbspReader &r, uint32_t uIdx, const ShortTermRps &prev, ShortTermRps &cur) noexcept
@@ -114,7 +122,7 @@ void ReadShortTermRps(RbspReader &r, uint32_t uIdx, const ShortTermRps &prev, Sh
     cur = ShortTermRps{};
     if (uIdx != 0 && r.Bit()) { // inter_ref_pic_set_prediction_flag
         const uint32_t uSign = r.Bit();
-        const int32_t iAbs = static_cast<int32_t>(r.UE(kMaxDeltaPocMinus1)) + 1;
+        const int32_t iAbs = DeltaPoc(r);
         const int32_t iDeltaRps = uSign ? -iAbs : iAbs;
         const uint32_t uRefPocs = prev.uNegative + prev.uPositive; // NumDeltaPocs[RefRpsIdx]
         bool bUseDelta[kMaxDpbSize + 1] = {};
@@ -157,13 +165,13 @@ void ReadShortTermRps(RbspReader &r, uint32_t uIdx, const ShortTermRps &prev, Sh
             return;
         int32_t iPoc = 0;
         for (uint32_t i = 0; i < cur.uNegative; ++i) {
-            iPoc -= static_cast<int32_t>(r.UE(kMaxDeltaPocMinus1)) + 1; // delta_poc_s0_minus1
+            iPoc -= DeltaPoc(r); // delta_poc_s0_minus1
             cur.iS0[i] = iPoc;
             r.Bit(); // used_by_curr_pic_s0_flag
         }
         iPoc = 0;
         for (uint32_t i = 0; i < cur.uPositive; ++i) {
-            iPoc += static_cast<int32_t>(r.UE(kMaxDeltaPocMinus1)) + 1; // delta_poc_s1_minus1
+            iPoc += DeltaPoc(r); // delta_poc_s1_minus1
             cur.iS1[i] = iPoc;
             r.Bit(); // used_by_curr_pic_s1_flag
         }

@@ -126,14 +126,15 @@ Converted StartCodesToLength(uint8_t *pDst, int64_t iDstSize, const uint8_t *pSr
         }
         size_t q = 0;
         size_t uRoom = 0;
-        uint8_t *pOut = nullptr;
+        uint8_t *pOut = pDst;
         if constexpr (kMeasure) {
             q = FindPrefix(pSrc, uBody, uLen);
         } else {
-            if (iWritten + iField > iDstSize)
-                return Converted::Fail(ConvertError::kNoRoom);
-            pOut = pDst + iWritten + iField;
-            uRoom = static_cast<size_t>(iDstSize - iWritten - iField);
+            // With no room left the unit is still found: an empty one needs none.
+            if (iWritten + iField < iDstSize) {
+                pOut = pDst + iWritten + iField;
+                uRoom = static_cast<size_t>(iDstSize - iWritten - iField);
+            }
             q = FindPrefixCopy(pSrc, uBody, uLen, pOut, uRoom);
         }
         const size_t uNext = ResolveCode(pSrc, uBody, uLen - 3, q);
@@ -152,7 +153,7 @@ Converted StartCodesToLength(uint8_t *pDst, int64_t iDstSize, const uint8_t *pSr
         if (uUnit > uMaxUnit)
             return Converted::Fail(ConvertError::kUnitTooLong);
         if constexpr (!kMeasure) {
-            if (uUnit > uRoom)
+            if (iWritten + iField + static_cast<int64_t>(uUnit) > iDstSize)
                 return Converted::Fail(ConvertError::kNoRoom);
             const size_t uCopied = q == kNotFound ? uLen : q;
             if (uUnitEnd > uCopied) // a prefix too close to the end to count belongs to the unit

@@ -220,7 +220,8 @@ VORCAL_API int32_t vorCALTools_HEVC_HvcCToAnnexB(uint8_t *pDst, int32_t iDstSize
  * parameter sets), min_spatial_segmentation_idc of its VUI, parallelismType from the PPSs,
  * numTemporalLayers and temporalIdNested of the SPS, lengthSizeMinusOne iNALLengthSize - 1 (1-4),
  * arrays VPS, SPS, PPS. Bytes written (with pDst null: the bytes needed), or a CAL_HEVC_ERR_* result
- * (CAL_HEVC_ERR_NOT_FOUND without an SPS that parses). */
+ * (CAL_HEVC_ERR_NOT_FOUND without a base-layer SPS, its own result when the first one does not
+ * parse, CAL_HEVC_ERR_MALFORMED for bit depths above 15, which the record cannot carry). */
 VORCAL_API int32_t vorCALTools_HEVC_MakeHvcC(uint8_t *pDst, int32_t iDstSize, const uint8_t *pSrc, int32_t iSrcLen,
                                              int32_t iNALLengthSize, uint32_t uFlags);
 

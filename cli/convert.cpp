@@ -318,12 +318,16 @@ int ReplayVerb(Console &console, int argc, char **argv)
         uDropped += !last.bCalled;
         std::string detail;
         if (codec == Codec::H264 && last.bCalled) {
-            std::vector<uint32_t> types;
+            // The units the codec got; fewer than the frame had means parameter sets were cut too.
+            std::vector<uint32_t> types, typesIn;
             const Framing framing = vorCALTools_AVC_CheckFormat(last.bytes.data(), static_cast<int32_t>(last.bytes.size())) ==
                                             CAL_AVC_FORMAT_ANNEXB
                                         ? Framing::AnnexB
                                         : Framing::LengthPrefixed;
             NalUnitTypes(last.bytes.data(), last.bytes.size(), framing, 4, types);
+            NalUnitTypes(packet.data.data(), packet.data.size(), info.framing, info.uNalLengthSize, typesIn);
+            if (std::string(pHow) == "converted" && types.size() < typesIn.size())
+                pHow = "stripped+converted";
             for (uint32_t uType : types)
                 detail += (detail.empty() ? "nal " : ",") + std::to_string(uType);
         } else if ((codec == Codec::AmrNb || codec == Codec::AmrWb) && last.bCalled && !last.bytes.empty() &&

@@ -103,7 +103,16 @@ int DumpVerb(Console &console, int argc, char **argv)
     int iDir = -1;
     if (!extractDir.empty() && (iDir = OpenDirectory(console, extractDir)) < 0)
         return kExitData;
+    const int iStatus = ListDump(console, *input, path, bJson, iDir, extractDir);
+    if (iDir >= 0)
+        close(iDir);
+    return iStatus;
+}
 
+int ListDump(const Console &console, Input &input, const std::string &path, bool bJson, int iDir,
+             const std::string &extractDir)
+{
+    Failure failure;
     if (!bJson)
         std::fprintf(console.pOut, "%-8s %-12s %-10s %-13s %-7s %-4s %s\n", "index", "offset", "length", "kind",
                      "framing", "nal", "first bytes");
@@ -112,11 +121,11 @@ int DumpVerb(Console &console, int argc, char **argv)
     int iStatus = kExitOk;
     std::vector<uint8_t> chunk(65536);
     for (;;) {
-        const uint64_t uOffset = input->Position();
+        const uint64_t uOffset = input.Position();
         uint8_t length[4];
         size_t uHave = 0, uGot = 0;
         bool bOk = true;
-        while (uHave < 4 && (bOk = input->Read(length + uHave, 4 - uHave, uGot, failure)) && uGot)
+        while (uHave < 4 && (bOk = input.Read(length + uHave, 4 - uHave, uGot, failure)) && uGot)
             uHave += uGot;
         if (!bOk)
             break;
@@ -129,17 +138,17 @@ int DumpVerb(Console &console, int argc, char **argv)
         }
         uint32_t uLength = 0;
         std::memcpy(&uLength, length, 4);
-        if (input->Seekable() && uLength > input->Size() - input->Position()) {
+        if (input.Seekable() && uLength > input.Size() - input.Position()) {
             failure.Set(uOffset, Sprintf("truncated: record %llu has length %u but only %llu bytes follow",
                                         static_cast<unsigned long long>(uIndex), uLength,
-                                        static_cast<unsigned long long>(input->Size() - input->Position())));
+                                        static_cast<unsigned long long>(input.Size() - input.Position())));
             break;
         }
         // The first bytes for the listing, then the rest streamed to the extracted file or skipped.
         const size_t uLook = std::min<size_t>(uLength, kLookBytes);
         uint8_t head[kLookBytes];
         size_t uHead = 0;
-        while (uHead < uLook && (bOk = input->Read(head + uHead, uLook - uHead, uGot, failure)) && uGot)
+        while (uHead < uLook && (bOk = input.Read(head + uHead, uLook - uHead, uGot, failure)) && uGot)
             uHead += uGot;
         int iOut = -1;
         if (bOk && iDir >= 0) {
@@ -158,11 +167,11 @@ int DumpVerb(Console &console, int argc, char **argv)
         while (bOk && uDone < uLength && uHead == uLook) {
             if (iOut < 0) {
                 uint64_t uSkipped = 0;
-                bOk = input->Skip(uLength - uDone, uSkipped, failure);
+                bOk = input.Skip(uLength - uDone, uSkipped, failure);
                 uDone += uSkipped;
                 break;
             }
-            bOk = input->Read(chunk.data(), static_cast<size_t>(std::min<uint64_t>(chunk.size(), uLength - uDone)), uGot,
+            bOk = input.Read(chunk.data(), static_cast<size_t>(std::min<uint64_t>(chunk.size(), uLength - uDone)), uGot,
                               failure);
             if (!bOk || uGot == 0)
                 break;
@@ -203,9 +212,7 @@ int DumpVerb(Console &console, int argc, char **argv)
         }
         ++uIndex;
     }
-    if (iDir >= 0)
-        close(iDir);
-    const uint64_t uBytes = input->Position();
+    const uint64_t uBytes = input.Position();
     if (bJson) {
         JsonWriter writer(console.pOut);
         Value root = Value::Object();

@@ -228,6 +228,8 @@ bool Input::ReadAt(uint64_t uOffset, uint8_t *pDst, size_t uWant, Failure &failu
                                     static_cast<unsigned long long>(uSize_)));
         return false;
     }
+    if (uWant == 0)
+        return true;
     if (pMemory_) {
         std::memcpy(pDst, pMemory_ + uOffset, uWant);
         return true;

@@ -517,6 +517,17 @@ private:
     bool bHaveFirst_;
 };
 
+// AMR-NB or AMR-WB when the bytes are one storage-format frame of either (RFC 4867 5.3: header
+// byte with the quality bit set and zero padding, then the bytes of its frame type).
+Codec AmrCodecOfFrame(const std::vector<uint8_t> &frame)
+{
+    if (frame.empty() || (frame[0] & 0x87) != 0x04)
+        return Codec::Unknown;
+    const unsigned uType = (frame[0] >> 3) & 0x0F;
+    const int iSize = static_cast<int>(frame.size()) - 1;
+    return kAmrNbBytes[uType] == iSize ? Codec::AmrNb : kAmrWbBytes[uType] == iSize ? Codec::AmrWb : Codec::Unknown;
+}
+
 // Best guess of the codec of a dump from its first record (the configuration) and its second.
 void DescribeDump(StreamInfo &info, const Packet *pSecond)
 {
@@ -536,11 +547,8 @@ void DescribeDump(StreamInfo &info, const Packet *pSecond)
         info.uNalLengthSize = (c[4] & 3u) + 1;
     } else if (pSecond && IsAdtsHeader(pSecond->data.data(), pSecond->data.size())) {
         info.codec = Codec::Aac;
-    } else if (pSecond && !pSecond->data.empty() && (pSecond->data[0] & 0x83) == 0x04 &&
-               (kAmrNbBytes[(pSecond->data[0] >> 3) & 0x0F] + 1 == static_cast<int>(pSecond->data.size()) ||
-                kAmrWbBytes[(pSecond->data[0] >> 3) & 0x0F] + 1 == static_cast<int>(pSecond->data.size()))) {
-        const int iBytes = kAmrNbBytes[(pSecond->data[0] >> 3) & 0x0F];
-        info.codec = iBytes + 1 == static_cast<int>(pSecond->data.size()) ? Codec::AmrNb : Codec::AmrWb;
+    } else if (const Codec amr = pSecond ? AmrCodecOfFrame(pSecond->data) : Codec::Unknown; amr != Codec::Unknown) {
+        info.codec = amr;
     } else if (c.size() >= 2 && c.size() <= 64 && (c[0] >> 3) >= 1) {
         info.codec = Codec::Aac; // an AudioSpecificConfig
     }

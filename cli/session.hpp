@@ -64,7 +64,6 @@ private:
     std::vector<std::pair<uint32_t, uint32_t>> answers_;
     CALHandle *pHandle_ = nullptr;
     CALCodec *pCodec_ = nullptr;
-    bool bInitDone_ = false;
     Received init_, last_;
 };
 

@@ -23,6 +23,11 @@ int ReplayVerb(Console &console, int argc, char **argv);
 int SilenceVerb(Console &console, int argc, char **argv);
 int DumpVerb(Console &console, int argc, char **argv);
 
+// Lists (and with iDir >= 0 extracts into that directory) the records of a dump read front to
+// back; the dump verb without its option parsing.
+int ListDump(const Console &console, Input &input, const std::string &path, bool bJson, int iDir,
+             const std::string &extractDir);
+
 // Prints "vorcal: VERB: TEXT" and the verb's usage line on the error stream; returns 2.
 int UsageError(const Console &console, const char *pVerb, const std::string &text);
 

@@ -43,9 +43,11 @@ Bytes Cat(std::initializer_list<Bytes> parts)
 
 Bytes Box(const char *pType, const Bytes &payload)
 {
-    Bytes box = Be32(static_cast<uint32_t>(payload.size() + 8));
-    box.insert(box.end(), pType, pType + 4);
-    box.insert(box.end(), payload.begin(), payload.end());
+    Bytes box(8 + payload.size());
+    const Bytes size = Be32(static_cast<uint32_t>(box.size()));
+    std::copy(size.begin(), size.end(), box.begin());
+    std::copy(pType, pType + 4, box.begin() + 4);
+    std::copy(payload.begin(), payload.end(), box.begin() + 8);
     return box;
 }
 

@@ -463,7 +463,7 @@ TEST(CliDump, ExtractsWithoutFollowingOrOverwriting)
     const std::vector<Bytes> records = Records(dir / "d.dump");
     ASSERT_EQ(Vorcal({"dump", dir / "d.dump", "--extract", dir / "x"}).iStatus, 0);
     for (size_t i = 0; i < records.size(); ++i) {
-        char name[32];
+        char name[48];
         std::snprintf(name, sizeof name, "x/record-%06zu.bin", i);
         EXPECT_EQ(ReadBytes(dir / name), records[i]) << name;
     }

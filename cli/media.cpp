@@ -316,7 +316,7 @@ public:
             if (!window_.Fill(10, failure))
                 return ReadResult::Error;
             const uint8_t *p = window_.Data();
-            const size_t n = window_.Size();
+            size_t n = window_.Size();
             if (n == 0)
                 return ReadResult::End;
             if (const uint64_t uTag = Id3v2Size(p, n)) {
@@ -324,9 +324,16 @@ public:
                     return ReadResult::Error;
                 continue;
             }
-            if (n == 128 && window_.AtEnd() && std::memcmp(p, "TAG", 3) == 0) {
-                window_.Consume(n);
-                return ReadResult::End;
+            // An ID3v1 tag: the last 128 bytes, starting "TAG".
+            if (n >= 3 && std::memcmp(p, "TAG", 3) == 0) {
+                if (!window_.Fill(129, failure))
+                    return ReadResult::Error;
+                if (window_.Size() == 128 && window_.AtEnd()) {
+                    window_.Consume(128);
+                    return ReadResult::End;
+                }
+                p = window_.Data(); // the window may have moved
+                n = window_.Size();
             }
             if (n < 7) {
                 failure.Set(window_.Offset(), Sprintf("truncated ADTS header: %zu bytes left", n));

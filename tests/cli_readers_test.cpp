@@ -67,12 +67,13 @@ struct Movie {
     std::vector<uint32_t> syncs = {1};
     uint32_t uFixedSize = 0;
     uint32_t uSampleCount = 0; // default: sizes.size()
+    uint8_t uLengthSizeByte = 0xFF; // avcC byte 4: lengthSizeMinusOne in its low bits
 };
 
 // ftyp, moov (one avc1 track with avcC and the sample tables), mdat holding the samples.
 Bytes BuildMovie(const Movie &m)
 {
-    const Bytes avcC = {1, 0x64, 0, 0x1F, 0xFF, 0xE1, 0, 4, 0x67, 0x64, 0, 0x1F, 1, 0, 1, 0x68};
+    const Bytes avcC = {1, 0x64, 0, 0x1F, m.uLengthSizeByte, 0xE1, 0, 4, 0x67, 0x64, 0, 0x1F, 1, 0, 1, 0x68};
     Bytes visual(78, 0);
     visual[7] = 1;                           // data_reference_index
     visual[24] = 0x01, visual[25] = 0x40;    // width 320
@@ -147,8 +148,15 @@ TEST(CliMp4, HandBuiltMovieGivesItsSamples)
     m.chunkOffsets = {0, 0}; // same table size as below, to learn where mdat lands
     const size_t uMdat = BuildMovie(m).size() - 22;
     m.chunkOffsets = {static_cast<uint32_t>(uMdat), static_cast<uint32_t>(uMdat + 18)};
+    m.uLengthSizeByte = 0xFD; // 2-byte NAL lengths
     std::vector<Packet> packets;
     ASSERT_EQ(ReadAll(BuildMovie(m), true, SIZE_MAX, &packets), "");
+    Failure failure;
+    const Bytes movie = BuildMovie(m);
+    const auto file = MediaFile::Open(Input::FromMemory(movie.data(), movie.size()), failure);
+    ASSERT_TRUE(file);
+    EXPECT_EQ(file->Streams()[0].uNalLengthSize, 2u);
+    EXPECT_EQ(file->Streams()[0].uWidth * 1000 + file->Streams()[0].uHeight, 320240u);
     ASSERT_EQ(packets.size(), 4u);
     const uint32_t kSizes[] = {5, 7, 6, 4};
     const int kSync[] = {1, 0, 0, 1};
@@ -343,6 +351,22 @@ TEST(CliStreams, PipeDeliveringFewBytesGivesTheSameFrames)
                 EXPECT_EQ(piped[i].data, whole[i].data) << pName << " frame " << i;
             }
         }
+    }
+}
+
+TEST(CliStreams, Id3TagsAroundAdtsAreSkipped)
+{
+    const Bytes adts = ReadFile("audio/adts-44100-2ch.aac");
+    // An ID3v2.4 tag of 20 bytes with a footer in front, an ID3v1 tag behind.
+    const Bytes front = Cat({{'I', 'D', '3', 4, 0, 0x10, 0, 0, 0, 20}, Bytes(20, 'x'), Bytes(10, 'f')});
+    const Bytes back = Cat({{'T', 'A', 'G'}, Bytes(125, ' ')});
+    std::vector<Packet> plain, tagged;
+    ASSERT_EQ(ReadAll(adts, true, SIZE_MAX, &plain), "");
+    ASSERT_EQ(ReadAll(Cat({front, adts, back}), false, 5, &tagged), "");
+    ASSERT_EQ(tagged.size(), plain.size());
+    for (size_t i = 0; i < plain.size(); ++i) {
+        EXPECT_EQ(tagged[i].uOffset, plain[i].uOffset + front.size()) << i;
+        EXPECT_EQ(tagged[i].data, plain[i].data) << i;
     }
 }
 

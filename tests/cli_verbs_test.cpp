@@ -274,6 +274,20 @@ TEST(CliFrames, AnnexBStreamsMatchTheirSidecars)
         }
         EXPECT_EQ(i, run.json["frames"].items.size()) << pName;
     }
+    // The other video fixtures: "frame SIZE PICT_TYPE KEY" lines.
+    for (const char *pName : {"video/mpeg2", "video/h263_qcif", "video/h263_cif", "video/h263p_320"}) {
+        const Outcome run = Vorcal({"frames", "--json", Data(std::string(pName) + ".frames")});
+        std::istringstream in(ReadText(Data(std::string(pName) + ".txt")));
+        size_t i = 0;
+        for (std::string line; std::getline(in, line);) {
+            if (line.rfind("frame ", 0) != 0)
+                continue;
+            const Json &f = run.json["frames"][i++];
+            EXPECT_EQ(line.substr(0, line.rfind(' ')), "frame " + f["size"].Scalar() + " " + f["pict_type"].text)
+                << pName << " frame " << i - 1;
+        }
+        EXPECT_EQ(i, run.json["frames"].items.size()) << pName;
+    }
 }
 
 // ---- convert and replay ---------------------------------------------------------------------

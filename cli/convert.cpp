@@ -294,7 +294,7 @@ int ReplayVerb(Console &console, int argc, char **argv)
         for (const auto &[key, value] : init.Members())
             if (key != "result" && key != "config_size" && key != "received" && key != "received_size")
                 std::fprintf(console.pOut, ", %s %s", key.c_str(), value.Text().c_str());
-        std::fprintf(console.pOut, "\n%-7s %-12s %-8s %-14s %-8s %s\n", "index", "offset", "size", "received", "size",
+        std::fprintf(console.pOut, "\n%-7s %-12s %-8s %-18s %-8s %s\n", "index", "offset", "size", "received", "size",
                      "detail");
     }
     if (bWrite)
@@ -346,7 +346,7 @@ int ReplayVerb(Console &console, int argc, char **argv)
             frame.Add("detail", detail);
             frames.Push(std::move(frame));
         } else {
-            std::fprintf(console.pOut, "%-7llu %-12llu %-8zu %-14s %-8zu %s\n", static_cast<unsigned long long>(uIndex),
+            std::fprintf(console.pOut, "%-7llu %-12llu %-8zu %-18s %-8zu %s\n", static_cast<unsigned long long>(uIndex),
                          static_cast<unsigned long long>(packet.uOffset), packet.data.size(), pHow, last.bytes.size(),
                          detail.c_str());
         }

@@ -127,7 +127,7 @@ bool LooksLikeDump(const uint8_t *p, size_t uSize, bool bAtEnd)
         uPos += 4 + size_t{uLen};
         ++uRecords;
     }
-    return uRecords > 0 && (uPos == uSize ? bAtEnd || uSize > 0 : !bAtEnd);
+    return uRecords > 0 && (uPos == uSize || !bAtEnd);
 }
 
 // ---------------------------------------------------------------------------------------------

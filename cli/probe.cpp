@@ -207,8 +207,10 @@ bool DescribeStream(const Console &console, const std::string &path, MediaFile &
         if (info.framing == Framing::LengthPrefixed)
             stream.Add("nal_length_size", info.uNalLengthSize);
     }
+    // The container's configuration is ffprobe's extradata; elsewhere it is what the tool found
+    // in front of the first frame (or built from the ADTS header, or a dump's first record).
     if (!info.config.empty())
-        stream.Add("extradata_size", static_cast<uint64_t>(info.config.size()));
+        stream.Add(bMp4 ? "extradata_size" : "config_size", static_cast<uint64_t>(info.config.size()));
     if (iFrames >= 0)
         stream.Add("nb_frames", std::to_string(iFrames));
     stream.Add("filename", path);

@@ -256,44 +256,6 @@ TEST(CliMp4, StructuralRefusals)
     EXPECT_NE(notice.find("movie fragments ('moof') are not read"), std::string::npos);
 }
 
-// Every box boundary of real movies, as a truncation point: the reader fails cleanly there.
-std::vector<size_t> BoxBoundaries(const Bytes &b, size_t uBegin, size_t uEnd)
-{
-    static const std::vector<std::string> kContainers = {"moov", "trak", "mdia", "minf", "stbl", "edts", "dinf"};
-    std::vector<size_t> cuts;
-    for (size_t p = uBegin; p + 8 <= uEnd;) {
-        const size_t uSize = (size_t{b[p]} << 24) | (size_t{b[p + 1]} << 16) | (size_t{b[p + 2]} << 8) | b[p + 3];
-        if (uSize < 8 || p + uSize > uEnd)
-            break;
-        cuts.push_back(p);
-        cuts.push_back(p + 8);
-        const std::string type(b.begin() + static_cast<ptrdiff_t>(p + 4), b.begin() + static_cast<ptrdiff_t>(p + 8));
-        if (std::find(kContainers.begin(), kContainers.end(), type) != kContainers.end()) {
-            const std::vector<size_t> inner = BoxBoundaries(b, p + 8, p + uSize);
-            cuts.insert(cuts.end(), inner.begin(), inner.end());
-        }
-        p += uSize;
-    }
-    return cuts;
-}
-
-TEST(CliMp4, TruncatedAtEveryBoxBoundaryFails)
-{
-    for (const char *pName : {"samples/h264_high.mp4", "samples/aac_lc.m4a", "heaac/bear_v1_aot5.mp4"}) {
-        const Bytes movie = ReadFile(pName);
-        ASSERT_GT(movie.size(), 1000u) << pName;
-        ASSERT_EQ(ReadAll(movie), "") << pName;
-        const std::vector<size_t> cuts = BoxBoundaries(movie, 0, movie.size());
-        EXPECT_GT(cuts.size(), 20u);
-        for (size_t uCut : cuts) {
-            const Bytes cut(movie.begin(), movie.begin() + static_cast<ptrdiff_t>(uCut));
-            const std::string text = ReadAll(cut);
-            EXPECT_FALSE(text.empty()) << pName << " cut at " << uCut;
-            EXPECT_EQ(text.find('\n'), std::string::npos);
-        }
-    }
-}
-
 TEST(CliDetect, FormatFromFirstBytes)
 {
     const struct {

@@ -206,6 +206,46 @@ TEST(CliProbe, MatchesTheFixtureSidecars)
     EXPECT_EQ(iFiles, 20);
 }
 
+// Every box boundary of real movies, as a truncation point: probe stops with exit 1 and one line
+// naming the file and an offset.
+std::vector<size_t> BoxBoundaries(const Bytes &b, size_t uBegin, size_t uEnd)
+{
+    static const std::vector<std::string> kContainers = {"moov", "trak", "mdia", "minf", "stbl", "edts", "dinf"};
+    std::vector<size_t> cuts;
+    for (size_t p = uBegin; p + 8 <= uEnd;) {
+        const size_t uSize = (size_t{b[p]} << 24) | (size_t{b[p + 1]} << 16) | (size_t{b[p + 2]} << 8) | b[p + 3];
+        if (uSize < 8 || p + uSize > uEnd)
+            break;
+        cuts.push_back(p);
+        cuts.push_back(p + 8);
+        const std::string type(b.begin() + static_cast<ptrdiff_t>(p + 4), b.begin() + static_cast<ptrdiff_t>(p + 8));
+        if (std::find(kContainers.begin(), kContainers.end(), type) != kContainers.end()) {
+            const std::vector<size_t> inner = BoxBoundaries(b, p + 8, p + uSize);
+            cuts.insert(cuts.end(), inner.begin(), inner.end());
+        }
+        p += uSize;
+    }
+    return cuts;
+}
+
+TEST(CliProbe, MoviesCutAtEveryBoxBoundaryFailInOneLine)
+{
+    TempDir dir;
+    for (const char *pName : {"samples/h264_high.mp4", "samples/aac_lc.m4a", "heaac/bear_v1_aot5.mp4"}) {
+        const Bytes movie = ReadBytes(Data(pName));
+        const std::vector<size_t> cuts = BoxBoundaries(movie, 0, movie.size());
+        EXPECT_GT(cuts.size(), 20u) << pName;
+        for (size_t uCut : cuts) {
+            std::ofstream(dir / "cut.mp4", std::ios::binary)
+                .write(reinterpret_cast<const char *>(movie.data()), static_cast<std::streamsize>(uCut));
+            const Outcome run = Vorcal({"probe", dir / "cut.mp4"});
+            EXPECT_EQ(run.iStatus, 1) << pName << " cut at " << uCut;
+            EXPECT_EQ(run.ErrLines(), 1u) << pName << " cut at " << uCut << ": " << run.err;
+            EXPECT_NE(run.err.find(uCut ? ": offset " : "the input is empty"), std::string::npos) << run.err;
+        }
+    }
+}
+
 // ---- frames against ffprobe's packets -----------------------------------------------------
 
 TEST(CliFrames, MatchFfprobePackets)

@@ -209,15 +209,15 @@ std::span<const uint8_t> Input::Peek(size_t uWant, Failure &failure)
         peeked_.erase(peeked_.begin(), peeked_.begin() + static_cast<ptrdiff_t>(uPeekedPos_));
         uPeekedPos_ = 0;
     }
-    while (peeked_.size() < uWant) {
-        const size_t uHave = peeked_.size();
-        peeked_.resize(uWant);
+    size_t uHave = peeked_.size();
+    peeked_.resize(std::max(uWant, uHave));
+    while (uHave < uWant) {
         size_t uGot = 0;
-        const bool bOk = RawRead(peeked_.data() + uHave, uWant - uHave, uGot, failure);
-        peeked_.resize(uHave + uGot);
-        if (!bOk || uGot == 0)
+        if (!RawRead(peeked_.data() + uHave, uWant - uHave, uGot, failure) || uGot == 0)
             break;
+        uHave += uGot;
     }
+    peeked_.resize(uHave);
     return {peeked_.data(), peeked_.size()};
 }
 

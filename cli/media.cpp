@@ -139,24 +139,25 @@ public:
     bool Fill(size_t uWant, Failure &failure)
     {
         while (Size() < uWant && !bEnd_) {
-            if (uStart_ > 0 && uStart_ >= buffer_.size() / 2) {
-                buffer_.erase(buffer_.begin(), buffer_.begin() + static_cast<ptrdiff_t>(uStart_));
+            if (uStart_ > 0 && uStart_ >= uEnd_ / 2) {
+                std::memmove(buffer_.data(), buffer_.data() + uStart_, uEnd_ - uStart_);
+                uEnd_ -= uStart_;
                 uStart_ = 0;
             }
-            const size_t uHave = buffer_.size();
-            buffer_.resize(uHave + std::max(kReadChunk, uWant - Size()));
+            // The storage only grows; reads land behind what is held.
+            const size_t uRoom = std::max(kReadChunk, uWant - Size());
+            if (buffer_.size() < uEnd_ + uRoom)
+                buffer_.resize(uEnd_ + uRoom);
             size_t uGot = 0;
-            const bool bOk = input_.Read(buffer_.data() + uHave, buffer_.size() - uHave, uGot, failure);
-            buffer_.resize(uHave + uGot);
-            if (!bOk)
+            if (!input_.Read(buffer_.data() + uEnd_, buffer_.size() - uEnd_, uGot, failure))
                 return false;
-            if (uGot == 0)
-                bEnd_ = true;
+            uEnd_ += uGot;
+            bEnd_ = uGot == 0;
         }
         return true;
     }
     const uint8_t *Data() const { return buffer_.data() + uStart_; }
-    size_t Size() const { return buffer_.size() - uStart_; }
+    size_t Size() const { return uEnd_ - uStart_; }
     uint64_t Offset() const { return uOffset_; }
     bool AtEnd() const { return bEnd_; }
     void Take(size_t uCount, Packet &packet)
@@ -174,7 +175,7 @@ public:
 private:
     Input &input_;
     std::vector<uint8_t> buffer_;
-    size_t uStart_ = 0;
+    size_t uStart_ = 0, uEnd_ = 0;
     uint64_t uOffset_ = 0;
     bool bEnd_ = false;
 };

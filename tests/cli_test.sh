@@ -3,9 +3,9 @@
 # the library and the tool lists it from a file, standard input, a pipe and a FIFO; hostile pipes
 # and FIFOs end with exit 1, one line on standard error, in bounded time and memory; -v shows the
 # layer's traces. The verbs themselves are tested in process by cli_verbs_test.
-# usage: cli_test.sh VORCAL EXAMPLE_ENGINE DATA_DIR [EMULATOR...]
+# usage: cli_test.sh VORCAL EXAMPLE_ENGINE DATA_DIR [EMULATOR...] (VORCAL_TEST_DATA_DIR overrides DATA_DIR)
 set -u
-vorcal=$1 engine=$2 data=$3
+vorcal=$1 engine=$2 data=${VORCAL_TEST_DATA_DIR:-$3}
 shift 3
 emu="$*"
 tmp=$(mktemp -d) || exit 1

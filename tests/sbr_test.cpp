@@ -26,7 +26,7 @@ const std::map<std::string, Codebook> &Codebooks()
 {
     static const auto books = [] {
         std::map<std::string, Codebook> out;
-        std::ifstream in(std::string(VORCAL_TEST_DATA_DIR) + "/sbr_huffman.tsv");
+        std::ifstream in(VORCAL_TEST_DATA_DIR "/sbr_huffman.tsv");
         std::string line, table, hex;
         int index = 0, value = 0, length = 0;
         while (std::getline(in, line)) // '#' comments; the column header fails the numeric fields

@@ -2,7 +2,7 @@
 
 #include <cstdlib>
 
-const char *vorcal::test::DataDir()
+std::string vorcal::test::DataDir()
 {
     const char *pDir = std::getenv("VORCAL_TEST_DATA_DIR");
     return pDir && *pDir ? pDir : VORCAL_TEST_DATA_DEFAULT;

@@ -3,8 +3,12 @@
 // tree. Every test program includes this header through the compiler (-include).
 #pragma once
 
+#include <string>
+
 namespace vorcal::test {
-const char *DataDir();
+std::string DataDir();
 } // namespace vorcal::test
 
-#define VORCAL_TEST_DATA_DIR ::vorcal::test::DataDir()
+// A std::string that still joins a string literal written after it: VORCAL_TEST_DATA_DIR "/x.tsv"
+// and std::string(VORCAL_TEST_DATA_DIR) + "/x" both work.
+#define VORCAL_TEST_DATA_DIR ::vorcal::test::DataDir() + ""

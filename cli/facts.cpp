@@ -250,7 +250,7 @@ AacFacts ExamineAacConfig(const StreamInfo &info)
 AacFrameExaminer::AacFrameExaminer(const StreamInfo &info)
 {
     // The layer's whole-frame AAC parser belongs here: one parser per stream, created from the
-    // AudioSpecificConfig (or for ADTS frames), fed every frame.
+    // AudioSpecificConfig (info.config), or without one when info.bAdtsFrames, fed every frame.
     (void)info;
 }
 

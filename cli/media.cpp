@@ -555,6 +555,7 @@ void DescribeDump(StreamInfo &info, const Packet *pSecond)
         info.uNalLengthSize = (c[4] & 3u) + 1;
     } else if (pSecond && IsAdtsHeader(pSecond->data.data(), pSecond->data.size())) {
         info.codec = Codec::Aac;
+        info.bAdtsFrames = true;
     } else if (const Codec amr = pSecond ? AmrCodecOfFrame(pSecond->data) : Codec::Unknown; amr != Codec::Unknown) {
         info.codec = amr;
     } else if (c.size() >= 2 && c.size() <= 64 && (c[0] >> 3) >= 1) {
@@ -601,6 +602,7 @@ void DescribeElementary(Format format, const Packet &first, StreamInfo &info)
         break;
     case Format::Adts: {
         info.codec = Codec::Aac;
+        info.bAdtsFrames = true;
         const unsigned uObjectType = (d[2] >> 6) + 1, uRateIndex = (d[2] >> 2) & 0x0F;
         const unsigned uChannelConfig = ((d[2] & 1u) << 2) | (d[3] >> 6);
         info.uSampleRate = uRateIndex < kAdtsRates.size() ? kAdtsRates[uRateIndex] : 0;

@@ -34,7 +34,8 @@ struct StreamInfo {
     uint32_t uTrackId = 0;
     uint32_t uObjectType = 0;    // 'esds' objectTypeIndication
     std::vector<uint8_t> config; // avcC record, parameter sets, AudioSpecificConfig, VOL headers
-    Framing framing = Framing::None;
+    Framing framing = Framing::None;             // H.264
+    bool bAdtsFrames = false;                    // AAC frames behind ADTS headers (else raw)
     uint32_t uNalLengthSize = 0;
     uint32_t uWidth = 0, uHeight = 0;        // as the container or stream header gives them
     uint32_t uSarNum = 0, uSarDen = 0;       // 'pasp'

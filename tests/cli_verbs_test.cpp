@@ -743,6 +743,9 @@ TEST(CliSps, HostileInputsEndInOneLine)
     TempDir dir;
     std::ofstream(dir / "long.bin", std::ios::binary) << std::string(100000, '\x11');
     std::ofstream(dir / "empty.bin", std::ios::binary);
+    const Bytes sps = {0x67, 0x42, 0xC0, 0x0C, 0xD9, 0x02, 0xC4, 0xEC, 0x04, 0x40, 0x00,
+                       0x00, 0x03, 0x00, 0x40, 0x00, 0x00, 0x0C, 0x83, 0xC5, 0x0A, 0x92};
+    std::ofstream(dir / "raw.sps", std::ios::binary).write(reinterpret_cast<const char *>(sps.data()), 22);
     const struct {
         std::vector<std::string> args;
         int iStatus;
@@ -763,6 +766,7 @@ TEST(CliSps, HostileInputsEndInOneLine)
         {{"sps", Data("samples/aac_lc.m4a")}, 1, "stream 0 is aac"},
         {{"sps", "--stream", "3", Data("samples/h264_high.mp4")}, 1, "no stream 3"},
         {{"sps", Data("samples/h264_high.mp4")}, 0, "High, level 13, 320x240 (coded 320x240), SAR 1:1, yuv420p"},
+        {{"sps", dir / "raw.sps"}, 0, "SPS from the file (SPS NAL unit), 22 bytes"},
     };
     for (const auto &c : kCases) {
         const Outcome run = Vorcal(c.args);

@@ -34,7 +34,9 @@ run:
 	@rm -rf $(RUN) && mkdir -p $(RUN)
 	$(VORCAL) --version
 	$(VORCAL) probe $(SAMPLES)/h264_high.mp4 $(SAMPLES)/aac_lc.m4a $(HEAAC)/bear_v1_aot5.mp4 \
-	  $(HEAAC)/bear_v1_implicit.aac $(SAMPLES)/amr_nb.amr $(SAMPLES)/mpeg4_asp.m4v
+	  $(SAMPLES)/amr_nb.amr $(SAMPLES)/mpeg4_asp.m4v
+	$(VORCAL) aac $(HEAAC)/bear_v1_implicit.aac
+	$(VORCAL) sps $(SAMPLES)/h264_high.mp4
 	$(VORCAL) frames $(SAMPLES)/h264_high.mp4
 	$(VORCAL) frames $(SAMPLES)/h264_misread.mp4
 	$(VORCAL) convert $(SAMPLES)/h264_high.mp4 $(RUN)/h264_high.h264 --to annexb

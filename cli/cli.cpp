@@ -90,6 +90,27 @@ constexpr Verb kVerbs[] = {
      "back. --extract writes record N to DIR/record-NNNNNN.bin; it never follows a symbolic link\n"
      "and never overwrites a file.\n",
      DumpVerb},
+    {"aac", "the whole-frame AAC parser over every frame",
+     "usage: vorcal aac [--frames] [--json] [--stream N] [--wait S] FILE\n"
+     "Runs vorCALTools_AAC_ParseFrame over every frame of the AAC stream (ADTS frames, or raw\n"
+     "frames with the stream's AudioSpecificConfig) and sums up: object type, core and output rate\n"
+     "and channels, SBR and PS and how each is signalled, frames, bytes, how many parsed to their\n"
+     "exact end, and the count of each result. Exit status 1 when any frame does not.\n"
+     "  --frames     one line per frame: offset, bytes, bits used, elements by id, SBR, PS, result\n"
+     "  --json       {\"stream\": {...}} (with --frames also \"frames\": [...])\n"
+     "  --stream N   the stream to parse (default: the first audio stream)\n",
+     AacVerb},
+    {"sps", "the full SPS parse and the documented SPS tool side by side",
+     "usage: vorcal sps [--json] [--stream N] [--wait S] FILE|HEX\n"
+     "Parses the first sequence parameter set with vorCALTools_AVC_ParseSPS and shows every field\n"
+     "beside what vorCALTools_AVC_GetSPSInfo reports for it. FILE is any input the tool reads (the\n"
+     "SPS of the configuration, else of the first frame that carries one), or a file holding an SPS\n"
+     "NAL unit, start-code framed bytes or an avcC record; HEX is such bytes as hex digits (spaces\n"
+     "and colons allowed), for example\n"
+     "  vorcal sps 67:42:c0:0c:d9:02:c4:ec:04:40:00:00:03:00:40:00:00:0c:83:c5:0a:92\n"
+     "  --json       one object: ffprobe's names for the picture facts, \"sps\" and \"sps_tool\"\n"
+     "  --stream N   the stream to read (default: the first video stream)\n",
+     SpsVerb},
     {"version", "the library's version strings", "usage: vorcal version (or vorcal --version)\n", VersionVerb},
 };
 

@@ -56,7 +56,8 @@ bool ParseOptions(Console &console, const char *pVerb, int argc, char **argv, Se
         uint32_t uProperty, uValue;
     };
     static constexpr Flag kFlags[] = {
-        {kOptStripPs, CAL_PROP_H264_INBAND_PARAM_SETS, 0},   {kOptTrustConfig, kPropTrustConfiguration, 1},
+        {kOptStripPs, CAL_PROP_H264_INBAND_PARAM_SETS, 0},
+        {kOptTrustConfig, CAL_PROP_TRUST_CONFIGURATION, 1},
         {kOptNoMain, CAL_PROP_H264_NO_MAIN_PROFILE, 1},      {kOptVopStart, CAL_PROP_MPEG4_VOP_START, 1},
         {kOptNoLevel3, CAL_PROP_MPEG4_NO_LEVEL3, 1},         {kOptNoUnknownProfile, CAL_PROP_MPEG4_NO_UNKNOWN_PROFILE, 1},
         {kOptNoH263Plus, CAL_PROP_H263_NO_EXTENDED_PTYPE, 1}, {kOptLockAmr, CAL_PROP_AMR_FRAME_TYPE_LOCK, 1},

@@ -11,17 +11,17 @@ namespace vorcal::cli {
 
 namespace {
 
-// A forward bit reader over RBSP bytes that drops emulation-prevention bytes (ITU-T H.264
-// 7.4.1) and reads zeros past the end.
-class RbspReader {
+// A forward bit reader that reads zeros past the end; over RBSP bytes (bRbsp) it drops
+// emulation-prevention bytes (ITU-T H.264 7.4.1).
+class BitReader {
 public:
-    RbspReader(const uint8_t *p, size_t uSize) : p_(p), uSize_(uSize) {}
+    BitReader(const uint8_t *p, size_t uSize, bool bRbsp = true) : p_(p), uSize_(uSize), bRbsp_(bRbsp) {}
     uint32_t Bit()
     {
         if (uBit_ == 8) {
             ++uPos_;
             uBit_ = 0;
-            if (uPos_ < uSize_ && uPos_ >= 2 && p_[uPos_] == 3 && p_[uPos_ - 1] == 0 && p_[uPos_ - 2] == 0)
+            if (bRbsp_ && uPos_ < uSize_ && uPos_ >= 2 && p_[uPos_] == 3 && p_[uPos_ - 1] == 0 && p_[uPos_ - 2] == 0)
                 ++uPos_;
         }
         const uint32_t v = uPos_ < uSize_ ? (p_[uPos_] >> (7 - uBit_)) & 1u : 0u;
@@ -44,10 +44,13 @@ public:
                 return 0xFFFFFFFFu;
         return (1u << uZeros) - 1 + Bits(uZeros);
     }
+    // Bits read so far (emulation-prevention bytes included).
+    size_t Position() const { return uPos_ * 8 + uBit_; }
 
 private:
     const uint8_t *p_;
     size_t uSize_;
+    bool bRbsp_;
     size_t uPos_ = 0;
     unsigned uBit_ = 0;
 };
@@ -93,6 +96,51 @@ std::vector<uint8_t> FirstSpsOfAvcC(const std::vector<uint8_t> &c)
     return {c.begin() + 8, c.begin() + 8 + static_cast<ptrdiff_t>(uLen)};
 }
 
+// Explicit SBR and PS signalling of an AudioSpecificConfig (ISO/IEC 14496-3 1.6.2.1): object
+// type 5 or 29 in front of the core object type, or the sync extensions 0x2B7 (SBR) and 0x548
+// (PS) behind the GASpecificConfig of a core object type 1-4.
+void ReadExplicitSignalling(const std::vector<uint8_t> &asc, AacFacts &facts)
+{
+    static constexpr std::array<uint32_t, 13> kRates = {96000, 88200, 64000, 48000, 44100, 32000, 24000,
+                                                        22050, 16000, 12000, 11025, 8000,  7350};
+    BitReader bits(asc.data(), asc.size(), false);
+    const size_t uTotal = asc.size() * 8;
+    auto ObjectType = [&] {
+        const uint32_t uType = bits.Bits(5);
+        return uType == 31 ? 32 + bits.Bits(6) : uType;
+    };
+    auto Rate = [&] {
+        const uint32_t uIndex = bits.Bits(4);
+        return uIndex == 15 ? bits.Bits(24) : uIndex < kRates.size() ? kRates[uIndex] : 0;
+    };
+    facts.uObjectType = ObjectType();
+    Rate();
+    const uint32_t uChannelConfig = bits.Bits(4);
+    if (facts.uObjectType == 5 || facts.uObjectType == 29) {
+        facts.sbr = Signal::Explicit;
+        facts.ps = facts.uObjectType == 29 ? Signal::Explicit : facts.ps;
+        facts.uExtRate = Rate();
+        return;
+    }
+    // A program config element (channel configuration 0) is not walked.
+    if (facts.uObjectType < 1 || facts.uObjectType > 4 || uChannelConfig == 0)
+        return;
+    bits.Bits(1);      // frameLengthFlag
+    if (bits.Bits(1))  // dependsOnCoreCoder
+        bits.Bits(14); // coreCoderDelay
+    bits.Bits(1);      // extensionFlag
+    if (bits.Position() + 16 > uTotal || bits.Bits(11) != 0x2B7 || ObjectType() != 5)
+        return;
+    if (!bits.Bits(1)) { // sbrPresentFlag
+        facts.sbr = facts.ps = Signal::None;
+        return;
+    }
+    facts.sbr = Signal::Explicit;
+    facts.uExtRate = Rate();
+    if (bits.Position() + 12 <= uTotal && bits.Bits(11) == 0x548)
+        facts.ps = bits.Bits(1) ? Signal::Explicit : Signal::None;
+}
+
 bool IsVcl(uint32_t uType)
 {
     return uType == 1 || uType == 2 || uType == 5;
@@ -117,32 +165,130 @@ uint32_t OtiOf(Codec codec)
 
 // ---- H.264 -------------------------------------------------------------------------------
 
-bool ParseFullSps(const std::vector<uint8_t> &nal, FullSps &sps)
+int32_t ParseFullSps(const std::vector<uint8_t> &nal, FullSps &sps)
 {
-    // The layer's full sequence parameter set parse belongs here; until it exists the display
-    // size, SAR, bit depth and chroma format come only from what the container and profile say.
-    (void)nal;
-    (void)sps;
-    return false;
+    if (nal.empty() || nal.size() > INT32_MAX) {
+        sps = FullSps{};
+        return CAL_AVC_SPS_ERR_ARGUMENT;
+    }
+    return vorCALTools_AVC_ParseSPS(nal.data(), static_cast<int32_t>(nal.size()), &sps);
 }
 
-AvcFacts ExamineAvc(const StreamInfo &info)
+std::vector<uint8_t> FindAvcSps(const std::vector<uint8_t> &data)
 {
-    AvcFacts facts;
-    const bool bRecord = info.config.size() >= 7 && info.config[0] == 1;
-    facts.sps = bRecord ? FirstSpsOfAvcC(info.config) : FindNalAnnexB(info.config, 7);
-    if (facts.sps.size() < 4)
-        return facts;
-    facts.uProfileIdc = facts.sps[1];
-    facts.uConstraintFlags = facts.sps[2];
-    facts.uLevelIdc = facts.sps[3];
+    if (data.size() >= 7 && data[0] == 1)
+        return FirstSpsOfAvcC(data);
+    if (std::vector<uint8_t> nal = FindNalAnnexB(data, 7); !nal.empty())
+        return nal;
+    // One SPS NAL unit: forbidden_zero_bit clear, nal_unit_type 7.
+    if (!data.empty() && (data[0] & 0x9F) == 7)
+        return data;
+    return {};
+}
+
+void ExamineAvcSps(const std::vector<uint8_t> &nal, AvcFacts &facts)
+{
+    facts.sps = nal;
+    if (facts.sps.empty())
+        return;
+    if (facts.sps.size() >= 4) {
+        facts.uProfileIdc = facts.sps[1];
+        facts.uConstraintFlags = facts.sps[2];
+        facts.uLevelIdc = facts.sps[3];
+    }
     // The documented tool reads start-code framed data.
     std::vector<uint8_t> framed = {0, 0, 0, 1};
     framed.insert(framed.end(), facts.sps.begin(), facts.sps.end());
     facts.uSpsToolResult =
         vorCALTools_AVC_GetSPSInfo(framed.data(), static_cast<int32_t>(framed.size()), &facts.spsTool);
-    facts.bFullSps = ParseFullSps(facts.sps, facts.full);
+    facts.iFullResult = ParseFullSps(facts.sps, facts.full);
+    facts.bFullSps = facts.iFullResult == CAL_AVC_SPS_OK;
+}
+
+AvcFacts ExamineAvc(const StreamInfo &info)
+{
+    AvcFacts facts;
+    ExamineAvcSps(FindAvcSps(info.config), facts);
     return facts;
+}
+
+std::string PixFmtName(const FullSps &sps)
+{
+    // 4:4:4 with matrix_coefficients 0 is coded as G, B, R planes (ISO/IEC 23091-2 8.3).
+    static constexpr std::array<const char *, 4> kChroma = {"gray", "yuv420p", "yuv422p", "yuv444p"};
+    const uint32_t uChroma = sps.uChromaFormatIdc & 3;
+    const bool bGbr = uChroma == 3 && sps.uMatrixCoefficients == 0;
+    const std::string base = bGbr ? "gbrp" : kChroma[uChroma];
+    if (sps.uBitDepthLuma != 8)
+        return Sprintf("%s%ule", base.c_str(), sps.uBitDepthLuma);
+    // Full-range 8-bit YUV has names of its own.
+    return sps.uVideoFullRange && uChroma != 0 && !bGbr ? "yuvj" + base.substr(3) : base;
+}
+
+std::string ColorRangeName(const FullSps &sps)
+{
+    // video_full_range_flag reads 0 both when coded so and when video_signal_type is absent; a
+    // colour description (which only follows the flag) tells the first apart.
+    if (sps.uVideoFullRange)
+        return "pc";
+    const bool bDescribed =
+        sps.uColourPrimaries != 2 || sps.uTransferCharacteristics != 2 || sps.uMatrixCoefficients != 2;
+    return bDescribed ? "tv" : std::string();
+}
+
+namespace {
+
+template <size_t N> const char *CodeName(const std::array<const char *, N> &names, uint32_t uCode)
+{
+    return uCode < N && names[uCode] ? names[uCode] : "unknown";
+}
+
+} // namespace
+
+const char *ColorPrimariesName(uint32_t uCode)
+{
+    static constexpr std::array<const char *, 23> kNames = {
+        "reserved", "bt709",    "unknown",  "reserved", "bt470m", "bt470bg", "smpte170m", "smpte240m",
+        "film",     "bt2020",   "smpte428", "smpte431", "smpte432", nullptr, nullptr,     nullptr,
+        nullptr,    nullptr,    nullptr,    nullptr,    nullptr,  nullptr,   "ebu3213"};
+    return CodeName(kNames, uCode);
+}
+
+const char *ColorTransferName(uint32_t uCode)
+{
+    static constexpr std::array<const char *, 19> kNames = {
+        "reserved", "bt709",  "unknown", "reserved",     "gamma22",      "gamma28",   "smpte170m",
+        "smpte240m", "linear", "log100", "log316",       "iec61966-2-4", "bt1361e",   "iec61966-2-1",
+        "bt2020-10", "bt2020-12", "smpte2084", "smpte428", "arib-std-b67"};
+    return CodeName(kNames, uCode);
+}
+
+const char *ColorSpaceName(uint32_t uCode)
+{
+    static constexpr std::array<const char *, 15> kNames = {
+        "gbr",     "bt709",    "unknown",   "reserved",          "fcc",              "bt470bg", "smpte170m",
+        "smpte240m", "ycgco",  "bt2020nc",  "bt2020c",           "smpte2085",        "chroma-derived-nc",
+        "chroma-derived-c", "ictcp"};
+    return CodeName(kNames, uCode);
+}
+
+const char *FullSpsResultName(int32_t iResult)
+{
+    switch (iResult) {
+    case CAL_AVC_SPS_OK: return "ok";
+    case CAL_AVC_SPS_ERR_ARGUMENT: return "bad argument";
+    case CAL_AVC_SPS_ERR_NOT_FOUND: return "no SPS";
+    case CAL_AVC_SPS_ERR_MALFORMED: return "malformed";
+    case CAL_AVC_SPS_ERR_TRUNCATED: return "truncated";
+    default: return "unknown result";
+    }
+}
+
+const char *SpsToolResultName(uint32_t uResult)
+{
+    static constexpr std::array<const char *, 4> kNames = {"parsed", "too short", "forbidden_zero_bit set",
+                                                           "no SPS, or pic_order_cnt_type above 2"};
+    return uResult < kNames.size() ? kNames[uResult] : "unknown result";
 }
 
 std::string AvcProfileName(uint32_t uProfileIdc, uint32_t uConstraintFlags)
@@ -234,33 +380,51 @@ AacFacts ExamineAacConfig(const StreamInfo &info)
     uint32_t uSbr = 0;
     vorCALTools_AAC_ParseDSI(info.config.data(), &facts.uCoreRate, &facts.uChannelConfig, &uSbr);
     facts.bDsiSbr = uSbr != 0;
-    // audioObjectType, with its escape (ISO/IEC 14496-3 1.6.2.1).
-    RbspReader bits(info.config.data(), info.config.size());
-    facts.uObjectType = bits.Bits(5);
-    if (facts.uObjectType == 31)
-        facts.uObjectType = 32 + bits.Bits(6);
     facts.uCoreChannels = ChannelsOfConfig(facts.uChannelConfig);
-    // Object types 5 (SBR) and 29 (PS) signal explicitly; anything else may still carry SBR or
-    // PS in its frames.
-    facts.sbr = facts.uObjectType == 5 || facts.uObjectType == 29 ? Signal::Explicit : Signal::NotExamined;
-    facts.ps = facts.uObjectType == 29 ? Signal::Explicit : Signal::NotExamined;
+    // What the configuration does not announce may still show in the frames.
+    facts.sbr = facts.ps = Signal::NotExamined;
+    ReadExplicitSignalling(info.config, facts);
     return facts;
 }
 
 AacFrameExaminer::AacFrameExaminer(const StreamInfo &info)
 {
-    // The layer's whole-frame AAC parser belongs here: one parser per stream, created from the
-    // AudioSpecificConfig (info.config), or without one when info.bAdtsFrames, fed every frame.
-    (void)info;
+    if (info.codec != Codec::Aac)
+        return;
+    if (info.bAdtsFrames)
+        pParser_ = vorCALTools_AAC_CreateParser(nullptr, 0);
+    else if (!info.config.empty() && info.config.size() <= INT32_MAX)
+        pParser_ = vorCALTools_AAC_CreateParser(info.config.data(), static_cast<int32_t>(info.config.size()));
 }
 
-void AacFrameExaminer::Frame(const Packet &packet)
+AacFrameExaminer::~AacFrameExaminer()
 {
-    (void)packet;
+    vorCALTools_AAC_DestroyParser(pParser_);
+}
+
+int32_t AacFrameExaminer::Frame(const Packet &packet, CALAACFrameInfo *pInfo)
+{
+    CALAACFrameInfo info{};
+    int32_t iResult = CAL_AAC_PARSE_BAD_INPUT;
+    if (pParser_ && packet.data.size() <= INT32_MAX) {
+        iResult = vorCALTools_AAC_ParseFrame(pParser_, packet.data.data(), static_cast<int32_t>(packet.data.size()),
+                                             &info);
+        // Only frames parsed to their end tell that SBR or PS is absent.
+        bExamined_ = bExamined_ || iResult == CAL_AAC_PARSE_OK;
+        bSbr_ = bSbr_ || info.uSBR;
+        bPs_ = bPs_ || info.uPS;
+    }
+    if (pInfo)
+        *pInfo = info;
+    return iResult;
 }
 
 void AacFrameExaminer::Finish(AacFacts &facts) const
 {
+    if (bSbr_ && facts.sbr == Signal::NotExamined)
+        facts.sbr = Signal::Implicit;
+    if (bPs_ && facts.ps == Signal::NotExamined)
+        facts.ps = Signal::Implicit;
     if (bExamined_) {
         if (facts.sbr == Signal::NotExamined)
             facts.sbr = Signal::None;
@@ -269,8 +433,16 @@ void AacFrameExaminer::Finish(AacFacts &facts) const
     }
     const bool bSbr = facts.sbr == Signal::Explicit || facts.sbr == Signal::Implicit;
     const bool bPs = facts.ps == Signal::Explicit || facts.ps == Signal::Implicit;
-    facts.uOutRate = bSbr ? facts.uCoreRate * 2 : facts.uCoreRate;
+    facts.uOutRate = !bSbr ? facts.uCoreRate : facts.uExtRate ? facts.uExtRate : facts.uCoreRate * 2;
     facts.uOutChannels = bPs ? 2 : facts.uCoreChannels;
+}
+
+const char *AacParseResultName(int32_t iResult)
+{
+    static constexpr std::array<const char *, 6> kNames = {"ok",      "bad input", "short",
+                                                           "refused", "overrun",   "leftover"};
+    return iResult >= 0 && static_cast<size_t>(iResult) < kNames.size() ? kNames[static_cast<size_t>(iResult)]
+                                                                        : "unknown result";
 }
 
 std::string AacProfileName(const AacFacts &facts)
@@ -375,7 +547,7 @@ FrameFacts ClassifyFrame(const StreamInfo &info, const Packet &packet)
             if (facts.pictType != "?" || !IsVcl(pUnit[0] & 0x1Fu))
                 return;
             static constexpr std::array<const char *, 5> kTypes = {"P", "B", "I", "SP", "SI"};
-            RbspReader bits(pUnit + 1, uUnit - 1);
+            BitReader bits(pUnit + 1, uUnit - 1);
             bits.UE();
             const uint32_t uType = bits.UE();
             facts.pictType = uType < 10 ? kTypes[uType % 5] : "?";

@@ -35,56 +35,26 @@ void DescribeAvc(const StreamInfo &info, Value &stream)
     if (const std::string profile = AvcProfileName(facts.uProfileIdc, facts.uConstraintFlags); !profile.empty())
         stream.Add("profile", profile);
     stream.Add("level", facts.uLevelIdc);
-    // The display size from a full SPS parse, else from the container, else the coded size
+    // The display size from the full SPS parse, else from the container, else the coded size
     // the documented tool reports.
     const CALSPSInfo &tool = facts.spsTool;
     if (facts.bFullSps) {
-        AddSize(stream, facts.full.uWidth, facts.full.uHeight);
-        stream.Add("coded_width", facts.full.uCodedWidth);
-        stream.Add("coded_height", facts.full.uCodedHeight);
-        stream.Add("size_source", "sps");
-    } else if (info.uWidth && info.uHeight) {
-        AddSize(stream, info.uWidth, info.uHeight);
-        stream.Add("size_source", "container");
-    } else if (facts.uSpsToolResult == 0) {
-        AddSize(stream, tool.uWidth, tool.uHeight);
-        stream.Add("size_source", "sps_tool (coded size, cropping not applied)");
+        DescribeFullSps(facts.full, stream);
+        if (!facts.full.uSarDen && info.uSarNum && info.uSarDen)
+            stream.Add("sample_aspect_ratio", Sprintf("%u:%u", info.uSarNum, info.uSarDen));
+    } else {
+        stream.Add("sps_error", FullSpsResultName(facts.iFullResult));
+        if (info.uWidth && info.uHeight) {
+            AddSize(stream, info.uWidth, info.uHeight);
+            stream.Add("size_source", "container");
+        } else if (facts.uSpsToolResult == 0) {
+            AddSize(stream, tool.uWidth, tool.uHeight);
+            stream.Add("size_source", "sps_tool (coded size, cropping not applied)");
+        }
+        if (info.uSarNum && info.uSarDen)
+            stream.Add("sample_aspect_ratio", Sprintf("%u:%u", info.uSarNum, info.uSarDen));
     }
-    uint32_t uSarNum = info.uSarNum, uSarDen = info.uSarDen;
-    if (facts.bFullSps && facts.full.uSarDen) {
-        uSarNum = facts.full.uSarNum;
-        uSarDen = facts.full.uSarDen;
-    }
-    if (uSarNum && uSarDen)
-        stream.Add("sample_aspect_ratio", Sprintf("%u:%u", uSarNum, uSarDen));
-    // Baseline, Main, Extended and High allow only 8-bit 4:2:0 (ITU-T H.264 A.2).
-    const bool b420by8 = facts.uProfileIdc == 66 || facts.uProfileIdc == 77 || facts.uProfileIdc == 88 ||
-                         facts.uProfileIdc == 100;
-    uint32_t uChroma = b420by8 ? 1 : 0, uDepth = b420by8 ? 8 : 0;
-    if (facts.bFullSps) {
-        uChroma = facts.full.uChromaFormatIdc;
-        uDepth = facts.full.uBitDepthLuma;
-    }
-    if (uDepth) {
-        static constexpr const char *kChroma[] = {"gray", "yuv420p", "yuv422p", "yuv444p"};
-        stream.Add("pix_fmt", uDepth == 8 ? std::string(kChroma[uChroma & 3])
-                                          : Sprintf("%s%ule", kChroma[uChroma & 3], uDepth));
-        stream.Add("bits_per_raw_sample", std::to_string(uDepth));
-        stream.Add("chroma_format_idc", uChroma);
-    }
-    Value sps = Value::Object();
-    sps.Add("result", facts.uSpsToolResult)
-        .Add("profile_idc", tool.uProfile)
-        .Add("level_idc", tool.uLevel)
-        .Add("width", tool.uWidth)
-        .Add("height", tool.uHeight)
-        .Add("ref_frames", tool.uRefFrames)
-        .Add("cropping", tool.uCropping)
-        .Add("crop_left", tool.uCropLeft)
-        .Add("crop_right", tool.uCropRight)
-        .Add("crop_top", tool.uCropTop)
-        .Add("crop_bottom", tool.uCropBottom);
-    stream.Add("sps_tool", std::move(sps));
+    stream.Add("sps_tool", SpsToolRecord(facts.uSpsToolResult, tool));
 }
 
 void DescribeVisual(const StreamInfo &info, const std::vector<uint8_t> &firstFrame, Value &stream)
@@ -225,6 +195,26 @@ bool DescribeStream(const Console &console, const std::string &path, MediaFile &
 }
 
 } // namespace
+
+void DescribeFullSps(const FullSps &sps, Value &stream)
+{
+    AddSize(stream, sps.uWidth, sps.uHeight);
+    stream.Add("coded_width", sps.uCodedWidth);
+    stream.Add("coded_height", sps.uCodedHeight);
+    stream.Add("size_source", "sps");
+    if (sps.uSarNum && sps.uSarDen)
+        stream.Add("sample_aspect_ratio", Sprintf("%u:%u", sps.uSarNum, sps.uSarDen));
+    stream.Add("pix_fmt", PixFmtName(sps));
+    if (const std::string range = ColorRangeName(sps); !range.empty())
+        stream.Add("color_range", range);
+    stream.Add("color_space", ColorSpaceName(sps.uMatrixCoefficients));
+    stream.Add("color_transfer", ColorTransferName(sps.uTransferCharacteristics));
+    stream.Add("color_primaries", ColorPrimariesName(sps.uColourPrimaries));
+    stream.Add("bits_per_raw_sample", std::to_string(sps.uBitDepthLuma));
+    stream.Add("chroma_format_idc", sps.uChromaFormatIdc);
+    if (sps.uBitDepthChroma != sps.uBitDepthLuma)
+        stream.Add("bit_depth_chroma", sps.uBitDepthChroma);
+}
 
 int ProbeVerb(Console &console, int argc, char **argv)
 {

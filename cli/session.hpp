@@ -13,10 +13,6 @@
 
 namespace vorcal::cli {
 
-// Asked at Init for H.264 by the stream-aware adaptation of the video decoder wrapper; a codec
-// that answers 1 trusts the configuration's framing and NAL length size over the per-frame test.
-constexpr uint32_t kPropTrustConfiguration = 0x1000;
-
 struct Received {
     bool bCalled = false;        // the codec's Decode (or Init) ran
     const uint8_t *p = nullptr;  // where the bytes were (the caller's buffer or the layer's)

@@ -8,6 +8,8 @@
 #include <string>
 #include <vector>
 
+#include <vorcal/video_tools.h>
+
 #include "common.hpp"
 #include "json.hpp"
 #include "media.hpp"
@@ -22,6 +24,14 @@ int ConvertVerb(Console &console, int argc, char **argv);
 int ReplayVerb(Console &console, int argc, char **argv);
 int SilenceVerb(Console &console, int argc, char **argv);
 int DumpVerb(Console &console, int argc, char **argv);
+int AacVerb(Console &console, int argc, char **argv);
+int SpsVerb(Console &console, int argc, char **argv);
+
+// The ffprobe-named picture facts of a full SPS parse (size, coded size, SAR, pix_fmt, colour
+// description, bit depth), as probe reports them.
+void DescribeFullSps(const CALAVCSPS &sps, Value &stream);
+// What vorCALTools_AVC_GetSPSInfo returned and reported.
+Value SpsToolRecord(uint32_t uResult, const CALSPSInfo &tool);
 
 // Lists (and with iDir >= 0 extracts into that directory) the records of a dump read front to
 // back; the dump verb without its option parsing.

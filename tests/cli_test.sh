@@ -81,6 +81,16 @@ v frames "$tmp/fifo" > "$tmp/frames.out" 2> "$tmp/err"
 expect "H.264 from a FIFO" 0
 wait
 grep -q '^# 10 frames, 2 key' "$tmp/frames.out" || { echo "FAIL: H.264 frames from a FIFO"; fail=1; }
+v aac - < "$data/heaac/bear_v1_implicit.aac" > "$tmp/aac.out" 2> "$tmp/err"
+expect "aac from standard input" 0
+grep -q '^62 frames, 23521 bytes, 62 parsed to their exact end$' "$tmp/aac.out" || { echo "FAIL: aac from a pipe"; fail=1; }
+cat "$data/h264/high10_64x48.h264" > "$tmp/fifo" &
+v sps "$tmp/fifo" > "$tmp/sps.out" 2> "$tmp/err"
+expect "sps from a FIFO" 0
+wait
+grep -q '^# High 10, level 10, 64x48 (coded 64x48), SAR 1:1, yuv420p10le,' "$tmp/sps.out" || { echo "FAIL: sps from a FIFO"; fail=1; }
+head -c 70000 /dev/zero | tr '\0' '\021' | v sps - > /dev/null 2> "$tmp/err"
+expect "70 kB of 0x11 from a pipe to sps" 1 "too long for parameter-set bytes"
 cat "$data/samples/h264_high.mp4" | v probe - > /dev/null 2> "$tmp/err"
 expect "MP4 from a pipe" 1 "give a file, not a pipe"
 

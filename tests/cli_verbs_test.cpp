@@ -5,6 +5,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <filesystem>
 #include <fstream>
 #include <map>
 #include <iterator>
@@ -16,6 +17,7 @@
 
 #include <gtest/gtest.h>
 
+#include "bit_writer.hpp"
 #include "json_reader.hpp"
 #include "verbs.hpp"
 
@@ -144,8 +146,8 @@ INSTANTIATE_TEST_SUITE_P(
         ProbeCase{"samples/mpeg4_asp.m4v", "mpeg4_asp.m4v.json", kVideoKeys},
         ProbeCase{"samples/aac_lc.m4a", "aac_lc.m4a.json", kAudioKeys},
         ProbeCase{"heaac/bear_v1_aot5.mp4", "heaac_aot5.json", kAudioKeys},
-        // Implicit SBR shows only in the frames: profile and rate wait for the whole-frame parser.
-        ProbeCase{"heaac/bear_v1_implicit.aac", "heaac_implicit.json", {"codec_name", "channels"}},
+        // Implicit SBR: only the frames tell that the output rate is twice the header's.
+        ProbeCase{"heaac/bear_v1_implicit.aac", "heaac_implicit.json", kAudioKeys},
         ProbeCase{"samples/amr_nb.amr", "amr_nb.amr.json", {"codec_type", "codec_name", "sample_rate", "channels"}}),
     [](const auto &info) {
         std::string name = info.param.pSidecar;
@@ -170,8 +172,8 @@ TEST(CliProbe, MatchesTheFixtureSidecars)
         std::vector<std::string> keys;
     } kCases[] = {
         {"h264/baseline_176x144.h264", "h264/baseline_176x144.h264.txt", {"width", "height", "profile", "level"}},
-        // The documented SPS tool gives the coded height (192); the display height waits for the full parse.
-        {"h264/main_320x180.h264", "h264/main_320x180.h264.txt", {"width", "profile", "level"}},
+        // Cropped from a coded height of 192.
+        {"h264/main_320x180.h264", "h264/main_320x180.h264.txt", {"width", "height", "profile", "level"}},
         {"video/h263_qcif.frames", "video/h263_qcif.txt", {"codec", "width", "height"}},
         {"video/h263p_320.frames", "video/h263p_320.txt", {"codec", "width", "height"}},
         {"video/mpeg2.frames", "video/mpeg2.txt", {"codec", "width", "height", "profile", "level"}},
@@ -204,6 +206,47 @@ TEST(CliProbe, MatchesTheFixtureSidecars)
         ++iFiles;
     }
     EXPECT_EQ(iFiles, 20);
+}
+
+// The H.264 profile fixtures' sidecars: ffprobe's "key=value" stream lines, then every syntax
+// element of the first SPS as "sps.NAME=V".
+std::map<std::string, std::string> KeyValueSidecar(const std::string &path)
+{
+    std::map<std::string, std::string> facts;
+    std::istringstream in(ReadText(path));
+    for (std::string line; std::getline(in, line);)
+        if (const size_t eq = line.find('='); eq != std::string::npos)
+            facts.emplace(line.substr(0, eq), line.substr(eq + 1));
+    return facts;
+}
+
+std::vector<std::string> ProfileFixtures()
+{
+    std::vector<std::string> names;
+    for (const auto &entry : std::filesystem::directory_iterator(Data("h264")))
+        if (entry.path().extension() == ".probe")
+            names.push_back(entry.path().stem().string());
+    std::sort(names.begin(), names.end());
+    return names;
+}
+
+TEST(CliProbe, MatchesTheProfileFixtures)
+{
+    const std::vector<std::string> names = ProfileFixtures();
+    ASSERT_GE(names.size(), 13u);
+    for (const std::string &name : names) {
+        const Outcome run = Vorcal({"probe", "--json", Data("h264/" + name + ".h264")});
+        ASSERT_EQ(run.iStatus, 0) << name << run.err;
+        const auto facts = KeyValueSidecar(Data("h264/" + name + ".probe"));
+        const Json &stream = run.json["streams"][0];
+        EXPECT_EQ(stream["size_source"].text, "sps") << name;
+        for (const char *pKey : {"profile", "level", "width", "height", "pix_fmt", "sample_aspect_ratio", "color_space",
+                                 "color_transfer", "color_primaries", "bits_per_raw_sample"}) {
+            EXPECT_EQ(stream[pKey].Scalar(), facts.at(pKey)) << name << " " << pKey;
+        }
+        // A range the SPS leaves open is not reported; ffprobe calls it unknown.
+        EXPECT_EQ(stream.Has("color_range") ? stream["color_range"].text : "unknown", facts.at("color_range")) << name;
+    }
 }
 
 // Every box boundary of real movies, as a truncation point: probe stops with exit 1 and one line
@@ -390,6 +433,77 @@ TEST(CliConvert, LengthPrefixedDumpAndStrippedParameterSets)
     EXPECT_EQ(wrong.ErrLines(), 1u) << wrong.err;
 }
 
+// The samples of h264_misread.mp4 whose first NAL length reads as a start code: the documented
+// adaptation passes them unconverted, the stream-aware one (--trust-config) converts every one.
+// A correct conversion is the samples' 4-byte lengths turned into 4-byte start codes, with the
+// avcC record's parameter sets in front; its decoded frames are the MD5s in h264_misread.txt.
+TEST(CliConvert, TrustedConfigurationConvertsTheMisreadSamples)
+{
+    const std::string mp4Path = Data("samples/h264_misread.mp4");
+    const Bytes mp4 = ReadBytes(mp4Path);
+    auto AnnexB = [](const uint8_t *p, size_t uSize) {
+        Bytes out;
+        for (size_t i = 0; i + 4 <= uSize;) {
+            const size_t uLen = size_t{p[i]} << 24 | size_t{p[i + 1]} << 16 | size_t{p[i + 2]} << 8 | p[i + 3];
+            out.insert(out.end(), {0, 0, 0, 1});
+            out.insert(out.end(), p + i + 4, p + i + 4 + uLen);
+            i += 4 + uLen;
+        }
+        return out;
+    };
+    // The avcC record (ISO/IEC 14496-15 5.3.3.1.2): SPS and PPS counts, each set behind a 2-byte length.
+    const uint8_t *pAvcC = &*std::search(mp4.begin(), mp4.end(), std::begin("avcC"), std::end("avcC") - 1) + 4;
+    size_t p = 5;
+    Bytes expected;
+    auto TakeSets = [&](size_t uCount) {
+        for (; uCount > 0; --uCount) {
+            const size_t uLen = size_t{pAvcC[p]} << 8 | pAvcC[p + 1];
+            expected.insert(expected.end(), {0, 0, 0, 1});
+            expected.insert(expected.end(), pAvcC + p + 2, pAvcC + p + 2 + uLen);
+            p += 2 + uLen;
+        }
+    };
+    TakeSets(pAvcC[p++] & 0x1Fu);
+    TakeSets(pAvcC[p++]);
+    const size_t uConfigBytes = expected.size();
+    const Outcome frames = Vorcal({"frames", "--json", mp4Path});
+    std::vector<Bytes> samples;
+    for (const Json &f : frames.json["frames"].items) {
+        samples.push_back(AnnexB(mp4.data() + f["offset"].Int(), static_cast<size_t>(f["size"].Int())));
+        expected.insert(expected.end(), samples.back().begin(), samples.back().end());
+    }
+    ASSERT_EQ(samples.size(), 12u);
+
+    TempDir dir;
+    const Outcome convert = Vorcal({"convert", mp4Path, dir / "trusted.h264", "--to", "annexb", "--trust-config"});
+    ASSERT_EQ(convert.iStatus, 0) << convert.err;
+    const Bytes trusted = ReadBytes(dir / "trusted.h264");
+    EXPECT_EQ(Bytes(trusted.begin(), trusted.begin() + static_cast<ptrdiff_t>(std::min(uConfigBytes, trusted.size()))),
+              Bytes(expected.begin(), expected.begin() + static_cast<ptrdiff_t>(uConfigBytes)));
+    EXPECT_TRUE(trusted == expected) << "the converted stream differs from the samples with start codes";
+
+    // Frame by frame, as the codec received them: the documented mode differs exactly at the
+    // misread samples.
+    std::vector<size_t> misread;
+    std::istringstream in(ReadText(Data("samples/h264_misread.txt")));
+    for (std::string word, value; in >> word >> value;)
+        if (word == "misread")
+            misread.push_back(std::stoul(value));
+    for (const bool bTrust : {false, true}) {
+        std::vector<std::string> args = {"replay", "--json", mp4Path, "--wants", "annexb", "-o", dir / "received.dump"};
+        if (bTrust)
+            args.push_back("--trust-config");
+        ASSERT_EQ(Vorcal(args).iStatus, 0);
+        const std::vector<Bytes> records = Records(dir / "received.dump");
+        ASSERT_EQ(records.size(), 13u);
+        std::vector<size_t> wrong;
+        for (size_t i = 0; i < 12; ++i)
+            if (records[i + 1] != samples[i])
+                wrong.push_back(i);
+        EXPECT_EQ(wrong, bTrust ? std::vector<size_t>{} : misread) << (bTrust ? "--trust-config" : "documented");
+    }
+}
+
 TEST(CliReplay, ShowsWhatTheCodecReceives)
 {
     TempDir dir;
@@ -465,8 +579,9 @@ TEST(CliSilence, WritesPlayableFiles)
         {{"--codec", "aac"}, "", 24, {0xFF, 0xF9, 0x90, 0x80, 0x03, 0x1F, 0x3C, 0x21}, "aac", "44100"},
         {{"--codec", "aac", "--channels", "1", "--rate", "8000"}, "", 18, {0xFF, 0xF9, 0xAC, 0x40}, "aac", "8000"},
         // HE-AAC frames carry the core rate (half the output) in their header.
-        {{"--codec", "he-aac", "--channels", "1"}, "", 29, {0xFF, 0xF9, 0x9C, 0x40, 0x03, 0xBF, 0x3C}, "aac", "22050"},
-        {{"--codec", "he-aacv2"}, "", 31, {0xFF, 0xF9, 0x9C, 0x40, 0x03, 0xFF, 0x3C}, "aac", "22050"},
+        // probe finds the SBR data in the frames and reports the output rate, as ffprobe does.
+        {{"--codec", "he-aac", "--channels", "1"}, "", 29, {0xFF, 0xF9, 0x9C, 0x40, 0x03, 0xBF, 0x3C}, "aac", "44100"},
+        {{"--codec", "he-aacv2"}, "", 31, {0xFF, 0xF9, 0x9C, 0x40, 0x03, 0xFF, 0x3C}, "aac", "44100"},
         {{"--codec", "amrnb", "--ft", "0"}, "#!AMR\n", 13, {0x04, 0x63, 0x3C, 0xC7}, "amr_nb", "8000"},
         {{"--codec", "amrwb"}, "#!AMR-WB\n", 61, {0x44, 0x11, 0x00, 0x00}, "amr_wb", "16000"},
         {{"--codec", "dra", "--rate", "44100"}, "", 8, {0x7F, 0xFF, 0x00, 0x5B, 0x93, 0xA0, 0x00, 0x1F}, "", ""},
@@ -546,6 +661,287 @@ TEST(CliDump, ExtractsWithoutFollowingOrOverwriting)
     EXPECT_EQ(truncated.ErrLines(), 1u);
     EXPECT_NE(truncated.err.find("truncated: record 12 has length"), std::string::npos) << truncated.err;
     EXPECT_EQ(truncated.json["nb_records"].Int(), 12);
+}
+
+// ---- sps against ffmpeg's reading of the same SPS ------------------------------------------
+
+// Our field, the syntax element the sidecar names, what is added to it, and our value when the
+// SPS does not carry it.
+struct SpsField {
+    const char *pOurs, *pTrace;
+    int iAdd, iAbsent;
+};
+
+constexpr SpsField kSpsFields[] = {
+    {"profile_idc", "profile_idc", 0, -1},
+    {"level_idc", "level_idc", 0, -1},
+    {"seq_parameter_set_id", "seq_parameter_set_id", 0, -1},
+    {"chroma_format_idc", "chroma_format_idc", 0, 1},
+    {"bit_depth_luma", "bit_depth_luma_minus8", 8, 8},
+    {"bit_depth_chroma", "bit_depth_chroma_minus8", 8, 8},
+    {"seq_scaling_matrix_present_flag", "seq_scaling_matrix_present_flag", 0, 0},
+    {"log2_max_frame_num", "log2_max_frame_num_minus4", 4, -1},
+    {"pic_order_cnt_type", "pic_order_cnt_type", 0, -1},
+    {"max_num_ref_frames", "max_num_ref_frames", 0, -1},
+    {"frame_mbs_only_flag", "frame_mbs_only_flag", 0, -1},
+    {"mb_adaptive_frame_field_flag", "mb_adaptive_frame_field_flag", 0, 0},
+    {"video_full_range_flag", "video_full_range_flag", 0, 0},
+    {"colour_primaries", "colour_primaries", 0, 2},
+    {"transfer_characteristics", "transfer_characteristics", 0, 2},
+    {"matrix_coefficients", "matrix_coefficients", 0, 2},
+    {"num_units_in_tick", "num_units_in_tick", 0, 0},
+    {"time_scale", "time_scale", 0, 0},
+    {"fixed_frame_rate_flag", "fixed_frame_rate_flag", 0, 0},
+    {"max_num_reorder_frames", "max_num_reorder_frames", 0, 0},
+    {"max_dec_frame_buffering", "max_dec_frame_buffering", 0, 0},
+};
+
+TEST(CliSps, MatchesTheSyntaxElementsOfTheProfileFixtures)
+{
+    for (const std::string &name : ProfileFixtures()) {
+        const auto facts = KeyValueSidecar(Data("h264/" + name + ".probe"));
+        auto Trace = [&](const std::string &key, int iAbsent, int iAdd = 0) {
+            const auto it = facts.find("sps." + key);
+            return it == facts.end() ? int64_t{iAbsent} : std::stoll(it->second) + iAdd;
+        };
+        // The stream, its decoder configuration record, and the SPS as hex with colons.
+        const Outcome stream = Vorcal({"sps", "--json", Data("h264/" + name + ".h264")});
+        ASSERT_EQ(stream.iStatus, 0) << name << stream.err;
+        std::string hex = stream.json["sps_bytes"].text;
+        std::replace(hex.begin(), hex.end(), ' ', ':');
+        for (const std::string &input : {Data("h264/" + name + ".h264"), Data("h264/" + name + ".avcc"), hex}) {
+            if (access(input.c_str(), F_OK) != 0 && input != hex)
+                continue; // a stream without a record
+            const Outcome run = Vorcal({"sps", "--json", input});
+            ASSERT_EQ(run.iStatus, 0) << input << run.err;
+            const Json &sps = run.json["sps"];
+            for (const SpsField &field : kSpsFields) {
+                EXPECT_EQ(sps[field.pOurs].Int(), Trace(field.pTrace, field.iAbsent, field.iAdd))
+                    << input << " " << field.pOurs;
+            }
+            int64_t iFlags = 0;
+            for (int i = 0; i < 6; ++i)
+                iFlags |= Trace("constraint_set" + std::to_string(i) + "_flag", 0) << (7 - i);
+            EXPECT_EQ(sps["constraint_set_flags"].Int(), iFlags) << input;
+            EXPECT_EQ(sps["coded_width"].Int(), (Trace("pic_width_in_mbs_minus1", -1) + 1) * 16) << input;
+            EXPECT_EQ(sps["coded_height"].Int(),
+                      (Trace("pic_height_in_map_units_minus1", -1) + 1) * 16 * (2 - Trace("frame_mbs_only_flag", -1)))
+                << input;
+            EXPECT_EQ(sps["width"].Scalar() + "x" + sps["height"].Scalar() + " " + sps["sar_num"].Scalar() + ":" +
+                          sps["sar_den"].Scalar(),
+                      facts.at("width") + "x" + facts.at("height") + " " + facts.at("sample_aspect_ratio"))
+                << input;
+            EXPECT_EQ(run.json["pix_fmt"].text, facts.at("pix_fmt")) << input;
+            // The documented tool on the same unit, beside it: its coded width is its own reading.
+            EXPECT_EQ(run.json["sps_tool"]["profile_idc"].Int(), Trace("profile_idc", -1)) << input;
+        }
+    }
+}
+
+TEST(CliSps, HostileInputsEndInOneLine)
+{
+    TempDir dir;
+    std::ofstream(dir / "long.bin", std::ios::binary) << std::string(100000, '\x11');
+    std::ofstream(dir / "empty.bin", std::ios::binary);
+    const Bytes sps = {0x67, 0x42, 0xC0, 0x0C, 0xD9, 0x02, 0xC4, 0xEC, 0x04, 0x40, 0x00,
+                       0x00, 0x03, 0x00, 0x40, 0x00, 0x00, 0x0C, 0x83, 0xC5, 0x0A, 0x92};
+    std::ofstream(dir / "raw.sps", std::ios::binary).write(reinterpret_cast<const char *>(sps.data()), 22);
+    const struct {
+        std::vector<std::string> args;
+        int iStatus;
+        std::string text;
+    } kCases[] = {
+        {{"sps"}, 2, "needs one file or hex string"},
+        {{"sps", "67", "68"}, 2, "needs one file or hex string"},
+        {{"sps", "--stream", "x", "67"}, 2, "bad option"},
+        {{"sps", "67 64 0"}, 1, "as hex an odd number of digits (5)"},
+        {{"sps", "00 00 01 68 ce 38 80"}, 1, "no SPS NAL unit in the hex bytes (7 bytes)"},
+        {{"sps", "01 64 00 0a ff e1 00 40 67"}, 1, "no SPS NAL unit in the hex bytes"}, // the record's SPS runs out
+        {{"sps", "67"}, 1, "the full SPS parse failed: truncated"},
+        {{"sps", "00:00:00:01:67:64"}, 1, "the full SPS parse failed: truncated"},
+        {{"sps", "6764000a00"}, 1, "the full SPS parse failed"},
+        {{"sps", "not-hex-and-no-file"}, 1, "No such file or directory"},
+        {{"sps", dir / "long.bin"}, 1, "too long for parameter-set bytes"},
+        {{"sps", dir / "empty.bin"}, 1, "the input is empty"},
+        {{"sps", Data("samples/aac_lc.m4a")}, 1, "stream 0 is aac"},
+        {{"sps", "--stream", "3", Data("samples/h264_high.mp4")}, 1, "no stream 3"},
+        {{"sps", Data("samples/h264_high.mp4")}, 0, "High, level 13, 320x240 (coded 320x240), SAR 1:1, yuv420p"},
+        {{"sps", dir / "raw.sps"}, 0, "SPS from the file (SPS NAL unit), 22 bytes"},
+    };
+    for (const auto &c : kCases) {
+        const Outcome run = Vorcal(c.args);
+        EXPECT_EQ(run.iStatus, c.iStatus) << ::testing::PrintToString(c.args) << run.err;
+        EXPECT_NE((c.iStatus ? run.err : run.out).find(c.text), std::string::npos)
+            << ::testing::PrintToString(c.args) << "\n" << run.err;
+        if (c.iStatus == 1) {
+            EXPECT_EQ(run.ErrLines(), 1u) << run.err;
+        }
+    }
+    // Every cut and every flipped byte of a real SPS: a record or one line of error, never more.
+    const Outcome ref = Vorcal({"sps", "--json", Data("h264/fullrange_64x48.avcc")});
+    std::string hex = ref.json["sps_bytes"].text;
+    hex.erase(std::remove(hex.begin(), hex.end(), ' '), hex.end());
+    for (size_t uCut = 2; uCut < hex.size(); uCut += 2) {
+        const Outcome run = Vorcal({"sps", hex.substr(0, uCut)});
+        EXPECT_EQ(run.ErrLines(), run.iStatus == 1 ? 1u : 0u) << hex.substr(0, uCut) << run.err;
+        EXPECT_TRUE(run.iStatus == 0 || run.iStatus == 1) << hex.substr(0, uCut);
+        if (uCut < 20) {
+            EXPECT_EQ(run.iStatus, 1) << hex.substr(0, uCut);
+        }
+        std::string flipped = hex;
+        flipped[uCut] = flipped[uCut] == 'f' ? '0' : 'f';
+        const Outcome bad = Vorcal({"sps", flipped});
+        EXPECT_EQ(bad.ErrLines(), bad.iStatus == 1 ? 1u : 0u) << flipped << bad.err;
+    }
+}
+
+// ---- aac against ffprobe -------------------------------------------------------------------------
+
+TEST(CliAac, SummariesMatchFfprobe)
+{
+    TempDir dir;
+    // Silence files of the layer: ffprobe reports HE-AAC 44100 Hz 2 ch and HE-AACv2 44100 Hz 2 ch.
+    ASSERT_EQ(Vorcal({"silence", "--codec", "he-aac", "--frames", "9", "-o", dir / "he.aac"}).iStatus, 0);
+    ASSERT_EQ(Vorcal({"silence", "--codec", "he-aacv2", "--frames", "9", "-o", dir / "v2.aac"}).iStatus, 0);
+    const struct {
+        std::string file;
+        const char *pSidecar; // ffprobe JSON in tests/data/samples, else the values below
+        std::string summary;  // profile sample_rate channels sbr ps core_sample_rate core_channels
+        std::string frames;   // nb_frames parsed_to_end, when there is no sidecar
+    } kCases[] = {
+        {Data("heaac/bear_v1_implicit.aac"), "heaac_implicit.json", "HE-AAC 44100 2 implicit none 22050 2", ""},
+        {Data("heaac/bear_v1_aot5.mp4"), "heaac_aot5.json", "HE-AAC 44100 2 explicit none 22050 2", ""},
+        {Data("samples/aac_lc.m4a"), "aac_lc.m4a.json", "LC 44100 2 none none 44100 2", ""},
+        {Data("aac/tools_44100_2ch.aac"), nullptr, "LC 44100 2 none none 44100 2", "45 45"},
+        {Data("aac/main_44100_2ch.aac"), nullptr, "Main 44100 2 none none 44100 2", "19 19"},
+        {dir / "he.aac", nullptr, "HE-AAC 44100 2 implicit none 22050 2", "9 9"},
+        {dir / "v2.aac", nullptr, "HE-AACv2 44100 2 implicit implicit 22050 1", "9 9"},
+    };
+    for (const auto &c : kCases) {
+        const Outcome run = Vorcal({"aac", "--json", "--frames", c.file});
+        ASSERT_EQ(run.iStatus, 0) << c.file << run.err;
+        const Json &s = run.json["stream"];
+        EXPECT_EQ(s["profile"].text + " " + s["sample_rate"].text + " " + s["channels"].Scalar() + " " + s["sbr"].text +
+                      " " + s["ps"].text + " " + s["core_sample_rate"].Scalar() + " " + s["core_channels"].Scalar(),
+                  c.summary)
+            << c.file;
+        EXPECT_EQ(s["parsed_to_end"].Scalar(), s["nb_frames"].text) << c.file;
+        if (!c.pSidecar) {
+            EXPECT_EQ(s["nb_frames"].text + " " + s["parsed_to_end"].Scalar(), c.frames) << c.file;
+            continue;
+        }
+        Json ref;
+        ASSERT_TRUE(Json::Parse(ReadText(Data(std::string("samples/") + c.pSidecar)), ref));
+        const Json &packets = ref["packets"];
+        ASSERT_EQ(run.json["frames"].items.size(), packets.items.size()) << c.file;
+        int64_t iBytes = 0;
+        for (size_t i = 0; i < packets.items.size(); ++i) {
+            const Json &f = run.json["frames"][i];
+            EXPECT_EQ(f["size"].Scalar(), packets[i]["size"].Scalar()) << c.file << " frame " << i;
+            // Parsed to its end: what is left after the last ID_END is byte padding.
+            EXPECT_EQ((f["bits"].Int() + 7) / 8, f["frame_bytes"].Int()) << c.file << " frame " << i;
+            EXPECT_EQ(f["elements"]["END"].Int(), 1) << c.file << " frame " << i;
+            EXPECT_EQ(f["sbr"].Int(), s["sbr"].text == "none" ? 0 : 1) << c.file << " frame " << i;
+            iBytes += f["size"].Int();
+        }
+        EXPECT_EQ(s["bytes"].Int(), iBytes) << c.file;
+    }
+}
+
+// A configuration in front of raw frames tells SBR and PS explicitly (object type 5, or the
+// sync extensions behind an AAC-LC configuration), or rules SBR out; without one, the frames tell.
+TEST(CliAac, ExplicitSignallingOfTheConfiguration)
+{
+    // The HE-AAC clip's raw frames (core 22050 Hz stereo, SBR in every frame) in a dump.
+    const Bytes movie = ReadBytes(Data("heaac/bear_v1_aot5.mp4"));
+    const Outcome frames = Vorcal({"frames", "--json", Data("heaac/bear_v1_aot5.mp4")});
+    ASSERT_FALSE(frames.json["frames"].items.empty());
+    auto LcConfig = [](int iSync) { // AAC-LC, 22050 Hz, 2 channels; then sync extensions
+        vorcal::test::BitWriter bits;
+        bits.Put(2, 5).Put(7, 4).Put(2, 4).Put(0, 3);
+        if (iSync >= 0)
+            bits.Put(0x2B7, 11).Put(5, 5).Put(iSync > 0, 1);
+        if (iSync > 0)
+            bits.Put(4, 4); // 44100 Hz
+        if (iSync > 1)
+            bits.Put(0x548, 11).Put(1, 1);
+        return bits.Align().Bytes();
+    };
+    const struct {
+        Bytes config;
+        std::string expected; // profile sample_rate channels sbr ps
+    } kCases[] = {
+        {ReadBytes(Data("heaac/bear_v1_aot5.asc")), "HE-AAC 44100 2 explicit none"},
+        {LcConfig(-1), "HE-AAC 44100 2 implicit none"},
+        {LcConfig(1), "HE-AAC 44100 2 explicit none"},
+        {LcConfig(2), "HE-AACv2 44100 2 explicit explicit"},
+        {LcConfig(0), "LC 22050 2 none none"},
+    };
+    TempDir dir;
+    for (const auto &c : kCases) {
+        {
+            std::ofstream out(dir / "heaac.dump", std::ios::binary);
+            auto Record = [&](const uint8_t *p, size_t uSize) {
+                const uint32_t uLen = static_cast<uint32_t>(uSize);
+                out.write(reinterpret_cast<const char *>(&uLen), 4).write(reinterpret_cast<const char *>(p), uLen);
+            };
+            Record(c.config.data(), c.config.size());
+            for (const Json &f : frames.json["frames"].items)
+                Record(movie.data() + f["offset"].Int(), static_cast<size_t>(f["size"].Int()));
+        }
+        const Outcome run = Vorcal({"aac", "--json", dir / "heaac.dump"});
+        EXPECT_EQ(run.iStatus, 0) << run.err;
+        const Json &s = run.json["stream"];
+        EXPECT_EQ(s["profile"].text + " " + s["sample_rate"].text + " " + s["channels"].Scalar() + " " + s["sbr"].text +
+                      " " + s["ps"].text,
+                  c.expected)
+            << ::testing::PrintToString(c.config);
+    }
+}
+
+TEST(CliAac, FramesThatDoNotParseToTheirEndEndInOneLine)
+{
+    TempDir dir;
+    // Every payload byte of a real ADTS stream scrambled, headers kept; then the same stream cut
+    // inside its last frame.
+    Bytes adts = ReadBytes(Data("aac/tools_44100_2ch.aac"));
+    uint32_t uSeed = 1;
+    for (size_t p = 0; p + 7 <= adts.size();) {
+        const size_t uLen = (size_t{adts[p + 3] & 3u} << 11) | (size_t{adts[p + 4]} << 3) | (adts[p + 5] >> 5);
+        for (size_t i = p + 9; i < p + uLen && i < adts.size(); ++i)
+            adts[i] = static_cast<uint8_t>((uSeed = uSeed * 1103515245u + 12345u) >> 24);
+        p += uLen;
+    }
+    std::ofstream(dir / "scrambled.aac", std::ios::binary)
+        .write(reinterpret_cast<const char *>(adts.data()), static_cast<std::streamsize>(adts.size()));
+    const Bytes clean = ReadBytes(Data("aac/tools_44100_2ch.aac"));
+    std::ofstream(dir / "cut.aac", std::ios::binary)
+        .write(reinterpret_cast<const char *>(clean.data()), static_cast<std::streamsize>(clean.size() - 50));
+    const struct {
+        std::vector<std::string> args;
+        int iStatus;
+        std::string text;
+    } kCases[] = {
+        {{"aac", dir / "scrambled.aac"}, 1, "offset 0: frame 0: "},
+        {{"aac", dir / "scrambled.aac"}, 1, "45 of 45 frames did not parse to their end"},
+        {{"aac", dir / "cut.aac"}, 1, "truncated"},
+        {{"aac", Data("aac/surround_48000_6ch.aac")}, 1, "frame 0: refused; 13 of 13"},
+        {{"aac", Data("samples/h264_high.mp4")}, 1, "stream 0 is h264, not AAC"},
+        {{"aac", "--stream", "1", Data("samples/aac_lc.m4a")}, 1, "no stream 1"},
+        {{"aac", Data("samples/amr_nb.amr")}, 1, "stream 0 is amr_nb, not AAC"},
+        {{"aac"}, 2, "needs one file"},
+        {{"aac", "--bogus", "x"}, 2, "bad option"},
+    };
+    for (const auto &c : kCases) {
+        const Outcome run = Vorcal(c.args);
+        EXPECT_EQ(run.iStatus, c.iStatus) << ::testing::PrintToString(c.args) << run.err;
+        EXPECT_NE(run.err.find(c.text), std::string::npos) << ::testing::PrintToString(c.args) << "\n" << run.err;
+        if (c.iStatus == 1) {
+            EXPECT_EQ(run.ErrLines(), 1u) << run.err;
+        }
+    }
+    const Outcome json = Vorcal({"aac", "--json", Data("aac/surround_48000_6ch.aac")});
+    EXPECT_EQ(json.json["stream"]["results"]["refused"].Int(), 13);
 }
 
 // ---- the command line ----------------------------------------------------------------------

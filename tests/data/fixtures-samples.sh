@@ -14,7 +14,8 @@
 #   h264_misread.mp4   H.264 High, 256x144, 12 frames, 4 slices of moving content: several samples
 #                      start with a length in 256-511. h264_misread.txt lists them ("misread N",
 #                      found from the samples by mp4_extract.py, not by vorcal) and the frame MD5s
-#                      a correct conversion decodes to.
+#                      a correct conversion decodes to; the script checks that `vorcal convert
+#                      --to annexb --trust-config` decodes to them.
 #   aac_lc.m4a         AAC-LC, 44100 Hz stereo, 1 s, in an M4A.
 #   mpeg4_asp.m4v      MPEG-4 Visual (Advanced Simple, B-VOPs), 176x144, 10 frames, elementary stream.
 #   amr_nb.amr         AMR-NB storage file. Debian's ffmpeg has no AMR encoder, so the frames are
@@ -73,6 +74,10 @@ ffmpeg -v error -y -f lavfi -i "testsrc2=size=256x144:rate=25" -frames:v 12 -pix
   -c:v libx264 -profile:v high -bf 2 -g 8 -x264-params slices=4 -movflags +faststart "$out/h264_misread.mp4"
 { misread "$out/h264_misread.mp4"; framemd5 "$out/h264_misread.mp4" | sed 's/^/md5 /'; } >"$out/h264_misread.txt"
 grep -q '^misread' "$out/h264_misread.txt" || { echo "h264_misread.mp4: no sample is misread"; exit 1; }
+"$vorcal" convert "$out/h264_misread.mp4" "$tmp/misread.h264" --to annexb --trust-config >/dev/null
+framemd5 "$tmp/misread.h264" | sed 's/^/md5 /' >"$tmp/misread.md5"
+grep '^md5' "$out/h264_misread.txt" | cmp -s - "$tmp/misread.md5" ||
+  { echo "h264_misread.mp4: the --trust-config conversion decodes to other frames"; exit 1; }
 probe "$out/h264_misread.mp4" "$out/h264_misread.mp4.json"
 
 ffmpeg -v error -y -f lavfi -i "sine=frequency=440:duration=1:sample_rate=44100" -ac 2 -c:a aac -b:a 64k \

@@ -1,6 +1,7 @@
 # vorcal: convenience targets over CMake.
-#   make run             build, then run the vorcal tool and the example engine on bundled samples
-#   make test            build, then run every CTest test
+#   make run             install a compiler and CMake when missing, build the library, libvorsal, the
+#                        vorcal tool and the example engine, and run the tool on the bundled samples
+#   make test            install GoogleTest too when missing, build everything, run every CTest test
 #   make check-sanitize  the whole suite under AddressSanitizer and UndefinedBehaviorSanitizer
 #   make check-arm       cross-build for 32-bit ARM and run the suite under qemu-arm
 #   make fuzz            build the libFuzzer targets with clang and run each FUZZ_SECONDS seconds
@@ -15,19 +16,43 @@ SUDO := $(shell [ "$$(id -u)" = 0 ] || echo sudo)
 
 .PHONY: all build run test check-sanitize check-arm fuzz bench install clean
 
+VORCAL := $(BUILD)/bin/vorcal
+SAMPLES := tests/data/samples
+HEAAC := tests/data/heaac
+RUN := $(BUILD)/run
+
 all: build
 
 build:
 	cmake -S . -B $(BUILD) $(GENERATOR) $(CMAKE_FLAGS)
 	cmake --build $(BUILD) -j $(JOBS)
 
-run: build
-	@mkdir -p $(BUILD)/run
-	$(BUILD)/bin/vorcal version
-	$(BUILD)/bin/vorcal_example_engine $(BUILD)/run/frames.dump
-	$(BUILD)/bin/vorcal dump $(BUILD)/run/frames.dump
+run:
+	@sh .ci/install-deps build
+	cmake -S . -B $(BUILD) $(GENERATOR) $(CMAKE_FLAGS)
+	cmake --build $(BUILD) -j $(JOBS) --target vorcal vorsal vorcal_cli vorcal_example_engine
+	@rm -rf $(RUN) && mkdir -p $(RUN)
+	$(VORCAL) --version
+	$(VORCAL) probe $(SAMPLES)/h264_high.mp4 $(SAMPLES)/aac_lc.m4a $(HEAAC)/bear_v1_aot5.mp4 \
+	  $(SAMPLES)/amr_nb.amr $(SAMPLES)/mpeg4_asp.m4v
+	$(VORCAL) aac $(HEAAC)/bear_v1_implicit.aac
+	$(VORCAL) sps $(SAMPLES)/h264_high.mp4
+	$(VORCAL) frames $(SAMPLES)/h264_high.mp4
+	$(VORCAL) frames $(SAMPLES)/h264_misread.mp4
+	$(VORCAL) convert $(SAMPLES)/h264_high.mp4 $(RUN)/h264_high.h264 --to annexb
+	$(VORCAL) frames $(RUN)/h264_high.h264
+	$(VORCAL) silence --codec aac -o $(RUN)/silence.aac
+	$(VORCAL) silence --codec amrnb -o $(RUN)/silence.amr
+	$(VORCAL) probe $(RUN)/silence.aac $(RUN)/silence.amr
+	$(VORCAL) replay $(SAMPLES)/amr_nb.amr --lock-amr --params
+	$(BUILD)/bin/vorcal_example_engine $(RUN)/frames.dump
+	$(VORCAL) dump $(RUN)/frames.dump
+	$(VORCAL) replay $(RUN)/frames.dump --wants annexb --strip-ps
 
-test: build
+test:
+	@sh .ci/install-deps test
+	cmake -S . -B $(BUILD) $(GENERATOR) $(CMAKE_FLAGS)
+	cmake --build $(BUILD) -j $(JOBS)
 	ctest --test-dir $(BUILD) --output-on-failure -j $(JOBS)
 
 check-sanitize:

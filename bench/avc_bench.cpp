@@ -1,8 +1,9 @@
-// H.264 framing tools against memcpy of the same frames in the same run. First a table of
-// interleaved rounds on streams made to the statistics of real 1080p x264 output
-// (bench/avc_stream.hpp): streamed (32 MB of frames, each converted to its own place in an
-// equally large destination, so both sides stream through memory) and cache-hot (the frames of
-// about 384 KB converted over and over), 1 and 8 slices a picture, 3- and 4-byte start codes.
+// H.264 and HEVC framing tools against memcpy of the same frames in the same run. First a table
+// of interleaved rounds on streams made to the statistics of real 1080p x264 output
+// (bench/avc_stream.hpp; the HEVC streams have the same unit sizes behind two-byte headers):
+// streamed (32 MB of frames, each converted to its own place in an equally large destination, so
+// both sides stream through memory) and cache-hot (the frames of about 384 KB converted over and
+// over), 1 and 8 slices a picture, 3- and 4-byte start codes.
 // Then the Google Benchmark cases on a smaller synthetic stream. Flags: --rounds=N (21),
 // --no-table, and Google Benchmark's own.
 #include <benchmark/benchmark.h>
@@ -186,32 +187,54 @@ struct Destination {
     }
 };
 
+// The conversion one case of the table measures: H.264 or HEVC (4-byte lengths out), from a frame
+// of n bytes into pDst with the headroom of the decoder adaptation.
+using ConvertFn = int32_t (*)(uint8_t *pDst, const uint8_t *pSrc, int32_t n);
+
+int32_t ConvertAvc(uint8_t *pDst, const uint8_t *pSrc, int32_t n)
+{
+    return vorCALTools_AVC_ConvertFormat(pDst, n + 100, pSrc, n, 4);
+}
+
+int32_t ConvertHevcAnnexB(uint8_t *pDst, const uint8_t *pSrc, int32_t n)
+{
+    return vorCALTools_HEVC_ConvertFormat(pDst, n + 100, pSrc, n, CAL_AVC_FORMAT_ANNEXB, 4);
+}
+
+int32_t ConvertHevcLengths(uint8_t *pDst, const uint8_t *pSrc, int32_t n)
+{
+    return vorCALTools_HEVC_ConvertFormat(pDst, n + 100, pSrc, n, CAL_AVC_FORMAT_NAL, 4);
+}
+
 void RatioTable(int rounds)
 {
     struct Shape {
-        const char *pName;
+        std::string name;
         int slices, code;
+        bool hevc;
         AvcStream stream;
     };
     std::vector<std::unique_ptr<Shape>> shapes;
-    for (int slices : {1, 8})
-        for (int code : {4, 3}) {
-            vorcal::bench::StreamShape shape;
-            shape.slices = slices;
-            shape.codeLength = code;
-            auto p = std::make_unique<Shape>(Shape{nullptr, slices, code, vorcal::bench::MakeCodedStream(shape)});
-            static const char *const kNames[2][2] = {{"1 slice, 4-byte codes", "1 slice, 3-byte codes"},
-                                                     {"8 slices, 4-byte codes", "8 slices, 3-byte codes"}};
-            p->pName = kNames[slices == 8][code == 3];
-            PrintStreamStatistics(p->pName, p->stream);
-            shapes.push_back(std::move(p));
-        }
+    for (bool hevc : {false, true})
+        for (int slices : {1, 8})
+            for (int code : {4, 3}) {
+                vorcal::bench::StreamShape shape;
+                shape.slices = slices;
+                shape.codeLength = code;
+                shape.hevc = hevc;
+                auto p = std::make_unique<Shape>(Shape{std::string(hevc ? "HEVC " : "") + (slices == 1 ? "1 slice" : "8 slices") +
+                                                           (code == 4 ? ", 4-byte codes" : ", 3-byte codes"),
+                                                       slices, code, hevc, vorcal::bench::MakeCodedStream(shape)});
+                PrintStreamStatistics(p->name.c_str(), p->stream);
+                shapes.push_back(std::move(p));
+            }
 
     constexpr size_t kStreamed = size_t{64} << 20, kHot = 384 << 10;
     std::vector<std::unique_ptr<Pass>> passes;
     std::vector<std::unique_ptr<Destination>> destinations;
     std::vector<vorcal::bench::RoundCase> cases;
-    auto Add = [&](std::string name, const std::vector<uint8_t> &source, const std::vector<AvcFrame> &frames, bool hot) {
+    auto Add = [&](std::string name, const std::vector<uint8_t> &source, const std::vector<AvcFrame> &frames, bool hot,
+                   ConvertFn convert) {
         passes.push_back(std::make_unique<Pass>(source, frames, hot ? 1 : 0, hot ? kHot : kStreamed));
         const Pass &pass = *passes.back();
         destinations.push_back(std::make_unique<Destination>(pass.OutBytes()));
@@ -221,11 +244,10 @@ void RatioTable(int rounds)
         c.bytes = static_cast<double>(pass.bytes);
         c.items = static_cast<double>(pass.frames.size());
         c.passes = hot ? vorcal::bench::PassesFor(c.bytes) : 1;
-        c.subject = [&pass, pDst] {
+        c.subject = [&pass, pDst, convert] {
             for (size_t i = 0; i < pass.frames.size(); ++i) {
                 const auto n = static_cast<int32_t>(pass.frames[i].size);
-                benchmark::DoNotOptimize(vorCALTools_AVC_ConvertFormat(pDst + pass.out[i], n + 100,
-                                                                       pass.pSource + pass.frames[i].offset, n, 4));
+                benchmark::DoNotOptimize(convert(pDst + pass.out[i], pass.pSource + pass.frames[i].offset, n));
             }
             benchmark::ClobberMemory();
         };
@@ -238,15 +260,17 @@ void RatioTable(int rounds)
     };
     for (bool hot : {false, true}) {
         for (const auto &shape : shapes)
-            Add(std::string("Annex B -> lengths, ") + shape->pName, shape->stream.annexB, shape->stream.annexBFrames, hot);
+            Add("Annex B -> lengths, " + shape->name, shape->stream.annexB, shape->stream.annexBFrames, hot,
+                shape->hevc ? ConvertHevcAnnexB : ConvertAvc);
         for (const auto &shape : shapes) {
             if (shape->code == 4)
-                Add(std::string("lengths -> Annex B, ") + (shape->slices == 1 ? "1 slice" : "8 slices"),
-                    shape->stream.lengthPrefixed, shape->stream.lengthFrames, hot);
+                Add(std::string("lengths -> Annex B, ") + (shape->hevc ? "HEVC " : "") + (shape->slices == 1 ? "1 slice" : "8 slices"),
+                    shape->stream.lengthPrefixed, shape->stream.lengthFrames, hot, shape->hevc ? ConvertHevcLengths : ConvertAvc);
         }
     }
     vorcal::bench::RunRounds(cases, rounds);
-    vorcal::bench::PrintRounds(cases, "vorCALTools_AVC_ConvertFormat", "memcpy of the same frames");
+    vorcal::bench::PrintRounds(cases, "vorCALTools_AVC_ConvertFormat / vorCALTools_HEVC_ConvertFormat",
+                               "memcpy of the same frames");
     std::printf("\n");
 }
 

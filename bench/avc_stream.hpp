@@ -101,6 +101,7 @@ struct StreamShape {
     int slices = 1;                  // slices per picture
     int codeLength = 4;              // 3 or 4: the start code in front of every unit
     uint32_t seed = 1;
+    bool hevc = false;               // HEVC units (two-byte headers: VPS, SPS, PPS, SEI, IDR, TRAIL) of the same sizes
 };
 
 namespace detail {
@@ -108,10 +109,12 @@ namespace detail {
 // One escaped NAL unit of n payload bytes appended to out: uniform random bytes (CABAC data)
 // with a zero pair planted about every 27 KB, three in ten of them followed by a byte <= 3
 // (escaped), and a non-zero last byte (rbsp_stop_one_bit).
-inline void AppendUnit(std::vector<uint8_t> &out, std::mt19937_64 &rng, uint8_t header, size_t n)
+inline void AppendUnit(std::vector<uint8_t> &out, std::mt19937_64 &rng, uint16_t header, size_t n, bool twoByteHeader)
 {
     constexpr size_t kPairSpacing = 55000; // uniform 0..kPairSpacing: 27.5 KB on average
-    out.push_back(header);
+    if (twoByteHeader)
+        out.push_back(static_cast<uint8_t>(header >> 8));
+    out.push_back(static_cast<uint8_t>(header));
     int zeros = 0;
     uint64_t word = 0;
     size_t plant = rng() % kPairSpacing;
@@ -152,26 +155,30 @@ inline AvcStream MakeCodedStream(const StreamShape &shape)
         const double mean = key ? 220000 : (bPicture ? 17000 : 33000);
         const double v = spread(rng);
         const size_t bytes = static_cast<size_t>(mean * (v < 0.2 ? 0.2 : (v > 2.0 ? 2.0 : v)));
-        std::vector<std::pair<uint8_t, size_t>> units;
+        // ITU-T H.264 headers, or H.265 ones (VPS first; IDR_W_RADL, TRAIL_R, TRAIL_N).
+        const bool hevc = shape.hevc;
+        std::vector<std::pair<uint16_t, size_t>> units;
         if (key) {
-            units.push_back({0x67, 20});
-            units.push_back({0x68, 5});
+            if (hevc)
+                units.push_back({0x4001, 24});
+            units.push_back({static_cast<uint16_t>(hevc ? 0x4201 : 0x67), hevc ? 40 : 20});
+            units.push_back({static_cast<uint16_t>(hevc ? 0x4401 : 0x68), 5});
             if (f == 0)
-                units.push_back({0x06, 700});
+                units.push_back({static_cast<uint16_t>(hevc ? 0x4E01 : 0x06), 700});
         }
         // Uneven slices: weights from 0.25 to 1.75.
         std::vector<double> w(static_cast<size_t>(shape.slices));
         double sum = 0;
         for (double &x : w)
             sum += x = 0.25 + 1.5 * static_cast<double>(rng() % 1024) / 1024;
+        const uint16_t slice = hevc ? (key ? 0x2601 : (bPicture ? 0x0001 : 0x0201)) : (key ? 0x65 : (bPicture ? 0x01 : 0x41));
         for (double x : w)
-            units.push_back({static_cast<uint8_t>(key ? 0x65 : (bPicture ? 0x01 : 0x41)),
-                             static_cast<size_t>(static_cast<double>(bytes) * x / sum) + 16});
+            units.push_back({slice, static_cast<size_t>(static_cast<double>(bytes) * x / sum) + 16});
 
         AvcFrame a{s.annexB.size(), 0, key}, l{s.lengthPrefixed.size(), 0, key};
         for (const auto &[header, n] : units) {
             unit.clear();
-            detail::AppendUnit(unit, rng, header, n);
+            detail::AppendUnit(unit, rng, header, n, hevc);
             if (shape.codeLength == 4)
                 s.annexB.push_back(0);
             s.annexB.insert(s.annexB.end(), {0, 0, 1});

@@ -8,23 +8,10 @@
 #include "core/sal.hpp"
 #include "tools/avc_convert.hpp"
 #include "tools/avc_nal.hpp"
+#include "tools/nal_convert.hpp"
 
 namespace vorcal::tools::avc {
 namespace {
-
-inline void PutBE32(uint8_t *p, uint32_t v) noexcept
-{
-    p[0] = static_cast<uint8_t>(v >> 24);
-    p[1] = static_cast<uint8_t>(v >> 16);
-    p[2] = static_cast<uint8_t>(v >> 8);
-    p[3] = static_cast<uint8_t>(v);
-}
-
-inline void PutBE16(uint8_t *p, uint32_t v) noexcept
-{
-    p[0] = static_cast<uint8_t>(v >> 8);
-    p[1] = static_cast<uint8_t>(v);
-}
 
 // Copies n bytes from src[iFrom] on; the part beyond iLen is zero-filled.
 void CopyPadded(uint8_t *pDst, const uint8_t *pSrc, int64_t iLen, int64_t iFrom, int64_t n) noexcept
@@ -37,99 +24,36 @@ void CopyPadded(uint8_t *pDst, const uint8_t *pSrc, int64_t iLen, int64_t iFrom,
         memset(pDst + iAvail, 0, static_cast<size_t>(n - iAvail));
 }
 
-// Length-prefixed units (size 1-4) to 4-byte start codes. Trailing bytes too few for another
-// length field are dropped. kMeasure counts the bytes without writing or tracing (pDst unused).
-template <bool kMeasure>
-int64_t LengthToAnnexB(uint8_t *pDst, int64_t iDstSize, const uint8_t *pSrc, int32_t iSrcLen, int32_t iSize) noexcept
+bool KeepSlice(uint8_t uHeader) noexcept
 {
-    if (!ValidNalLengthSize(iSize))
-        return -1;
-    if (iSrcLen <= iSize)
-        return 0;
-    // With 4-byte fields every unit keeps its place: one copy of as much as the destination
-    // holds, then the walk turns each field into a start code.
-    const bool bInPlace = iSize == 4;
-    if constexpr (!kMeasure) {
-        if (bInPlace && iDstSize > 0)
-            memcpy(pDst, pSrc, static_cast<size_t>(iSrcLen < iDstSize ? iSrcLen : iDstSize));
-    }
-    int64_t iRemaining = iSrcLen;
-    int64_t iPos = 0;
-    int64_t iWritten = 0;
-    do {
-        const uint32_t uUnit = ReadNalLength(pSrc, iSrcLen, iPos, iSize);
-        iPos += iSize;
-        iRemaining -= iSize;
-        if (uUnit > iRemaining) {
-            if constexpr (!kMeasure)
-                VORCAL_TRACE(kTraceH264Tools, 0, "[CAL_Tools %d] vorCALTools_AVC_ConvertFormat Error(%d, %d)\n",
-                             __LINE__, static_cast<int>(iRemaining), static_cast<int>(uUnit));
-            return -1;
-        }
-        if constexpr (!kMeasure) {
-            if (iWritten + 4 + uUnit > iDstSize)
-                return -1;
-            memcpy(pDst + iWritten, kStartCode, 4);
-            if (!bInPlace)
-                memcpy(pDst + iWritten + 4, pSrc + iPos, uUnit);
-        }
-        iWritten += 4 + int64_t{uUnit};
-        iPos += uUnit;
-        iRemaining -= uUnit;
-    } while (iRemaining > iSize);
-    return iWritten;
+    return IsSlice(NalType(uHeader));
 }
 
-// Start codes to 4-byte length prefixes. Each unit runs to the next start code that
-// vorCALTools_AVC_FindStartCode finds after the current one; the search and the copy of the
-// unit are one pass. With bSlicesOnly only coded slices are written. kMeasure counts the bytes
-// without writing or tracing (pDst unused).
+// Length fields of any size 1-4 to 4-byte start codes; trailing bytes too few for another
+// length field are dropped. Start codes to 4-byte lengths, each unit running to the next start
+// code vorCALTools_AVC_FindStartCode finds after its own; with bSlicesOnly only coded slices are
+// written. kMeasure counts the bytes without writing or tracing (pDst unused).
 template <bool kMeasure>
-int64_t AnnexBToLength(uint8_t *pDst, int64_t iDstSize, const uint8_t *pSrc, int32_t iSrcLen, bool bSlicesOnly) noexcept
+int64_t ConvertUnits(uint8_t *pDst, int64_t iRoom, const uint8_t *pSrc, int32_t iSrcLen, int32_t iSize,
+                     int32_t iSourceFormat, bool bSlicesOnly) noexcept
 {
-    const size_t uLen = iSrcLen > 0 ? static_cast<size_t>(iSrcLen) : 0;
-    size_t uPos = 0;
-    int64_t iWritten = 0;
-    do {
-        const int32_t iCode = StartCodeLengthAt(pSrc, iSrcLen, static_cast<int64_t>(uPos));
-        if (iCode == 0)
+    nal::Converted r;
+    if (iSourceFormat == CAL_AVC_FORMAT_NAL) {
+        if (!nal::ValidLengthSize(iSize))
             return -1;
-        // A start code lies wholly inside the data, so uLen >= 3 from here on.
-        const size_t uBody = uPos + static_cast<size_t>(iCode);
-        if (bSlicesOnly && !IsSlice(ByteAt(pSrc, iSrcLen, static_cast<int64_t>(uBody)) & kTypeMask)) {
-            const int64_t iNext = FindCode(pSrc, uBody + 1, uLen - 3, uLen);
-            if (iNext < 0) {
-                if constexpr (!kMeasure)
-                    VORCAL_TRACE_PLAIN("[vorCAL_Tools %d] No correct Frame.\n", __LINE__);
-                return -1;
-            }
-            uPos = static_cast<size_t>(iNext);
-            continue;
-        }
-        size_t q = 0;
-        size_t uRoom = 0;
-        if constexpr (kMeasure) {
-            q = FindStartCodePrefix(pSrc, uBody, uLen);
-        } else {
-            if (iWritten + 4 > iDstSize)
-                return -1;
-            uRoom = static_cast<size_t>(iDstSize - iWritten - 4);
-            q = FindStartCodePrefixCopy(pSrc, uBody, uLen, pDst + iWritten + 4, uRoom);
-        }
-        const int64_t iNext = ResolveCode(pSrc, uBody, uLen - 3, q, uLen);
-        const size_t uUnitEnd = iNext < 0 ? uLen : static_cast<size_t>(iNext);
-        const size_t uUnit = uUnitEnd - uBody;
-        if constexpr (!kMeasure) {
-            if (uUnit > uRoom)
-                return -1;
-            if (uUnitEnd > q) // a prefix too close to the end to count belongs to the unit
-                memcpy(pDst + iWritten + 4 + (q - uBody), pSrc + q, uUnitEnd - q);
-            PutBE32(pDst + iWritten, static_cast<uint32_t>(uUnit));
-        }
-        iWritten += 4 + static_cast<int64_t>(uUnit);
-        uPos = uUnitEnd;
-    } while (uPos < uLen);
-    return iWritten;
+        r = nal::LengthToStartCodes<kMeasure>(pDst, iRoom, pSrc, iSrcLen, {iSize, false, 0});
+    } else {
+        r = nal::StartCodesToLength<kMeasure>(pDst, iRoom, pSrc, iSrcLen,
+                                              {4, false, false, 0, bSlicesOnly ? KeepSlice : nullptr});
+    }
+    if constexpr (!kMeasure) {
+        if (r.eError == nal::ConvertError::kLengthBeyondData)
+            VORCAL_TRACE(kTraceH264Tools, 0, "[CAL_Tools %d] vorCALTools_AVC_ConvertFormat Error(%d, %d)\n", __LINE__,
+                         static_cast<int>(r.iRemaining), static_cast<int>(r.uUnit));
+        else if (r.eError == nal::ConvertError::kNoNextUnit)
+            VORCAL_TRACE_PLAIN("[vorCAL_Tools %d] No correct Frame.\n", __LINE__);
+    }
+    return r.Ok() ? r.iBytes : -1;
 }
 
 // The conversion from a source of the framing given; results fit 32 bits whenever they fit the
@@ -141,9 +65,7 @@ int64_t Convert(uint8_t *pDst, int32_t iDstSize, const uint8_t *pSrc, int32_t iS
     if (iSrcLen < iSize || pSrc == nullptr)
         return -1;
     const int64_t iRoom = (pDst != nullptr && iDstSize > 0) ? iDstSize : 0;
-    if (iSourceFormat == CAL_AVC_FORMAT_NAL)
-        return LengthToAnnexB<kMeasure>(pDst, iRoom, pSrc, iSrcLen, iSize);
-    return AnnexBToLength<kMeasure>(pDst, iRoom, pSrc, iSrcLen, bSlicesOnly);
+    return ConvertUnits<kMeasure>(pDst, iRoom, pSrc, iSrcLen, iSize, iSourceFormat, bSlicesOnly);
 }
 
 int32_t ConvertFormat(uint8_t *pDst, int32_t iDstSize, const uint8_t *pSrc, int32_t iSrcLen,
@@ -165,11 +87,11 @@ struct EntryCopier {
 
     bool Copy() noexcept
     {
-        const int64_t iUnit = (ByteAt(pSrc, iSrcLen, iPos) << 8) | ByteAt(pSrc, iSrcLen, iPos + 1);
+        const int64_t iUnit = nal::ReadBE(pSrc, iSrcLen, iPos, 2);
         if (4 + iUnit > iRoom)
             return false;
         uint8_t *pOut = pDst + (iDstSize - iRoom);
-        memcpy(pOut, kStartCode, 4);
+        memcpy(pOut, nal::kStartCode, 4);
         CopyPadded(pOut + 4, pSrc, iSrcLen, iPos + 2, iUnit);
         iPos += 2 + iUnit;
         iRoom -= 4 + iUnit;
@@ -190,7 +112,7 @@ struct EntryCopier {
 
 int32_t ContainerToAnnexB(uint8_t *pDst, int32_t iDstSize, const uint8_t *pSrc, int32_t iSrcLen) noexcept
 {
-    auto b = [&](int64_t i) { return ByteAt(pSrc, iSrcLen, i); };
+    auto b = [&](int64_t i) { return nal::ByteAt(pSrc, iSrcLen, i); };
     // A configuration record repeats AVCProfileIndication as the SPS's profile_idc (byte 9);
     // a list has the SPS count at byte 0 and, with one SPS, its NAL header at byte 3.
     const bool bRecord = b(1) != 0 && (b(3) & kTypeMask) != kNalSps && b(9) == b(1) && iSrcLen >= 16;
@@ -209,16 +131,16 @@ int32_t ContainerToAnnexB(uint8_t *pDst, int32_t iDstSize, const uint8_t *pSrc, 
 
 // The first unit from uFrom on (primed scan, resuming at each header) whose header has
 // forbidden_zero_bit clear and type uType.
-ScannedCode FindUnit(const uint8_t *pSrc, size_t uLen, size_t uFrom, uint32_t uType) noexcept
+nal::ScannedCode FindUnit(const uint8_t *pSrc, size_t uLen, size_t uFrom, uint32_t uType) noexcept
 {
     for (;;) {
-        const ScannedCode c = ScanPrimed(pSrc, uFrom, uLen);
-        if (c.iPos < 0)
+        const nal::ScannedCode c = nal::ScanPrimed(pSrc, uFrom, uLen);
+        if (c.uPos == nal::kNotFound)
             return c;
-        const uint8_t h = ByteAt(pSrc, static_cast<int64_t>(uLen), c.iHeader);
-        if ((h & kForbiddenBit) == 0 && (h & kTypeMask) == uType)
+        const uint8_t h = nal::ByteAt(pSrc, static_cast<int64_t>(uLen), static_cast<int64_t>(c.uHeader));
+        if ((h & kForbiddenBit) == 0 && NalType(h) == uType)
             return c;
-        uFrom = static_cast<size_t>(c.iHeader);
+        uFrom = c.uHeader;
     }
 }
 
@@ -231,24 +153,24 @@ int32_t AnnexBToList(uint8_t *pDst, int32_t iDstSize, const uint8_t *pSrc, int32
     if (iSrcLen <= 3)
         return 0;
     const size_t uLen = static_cast<size_t>(iSrcLen);
-    const ScannedCode sps = FindUnit(pSrc, uLen, 0, kNalSps);
-    if (sps.iPos < 0 || sps.iHeader >= iSrcLen)
+    const nal::ScannedCode sps = FindUnit(pSrc, uLen, 0, kNalSps);
+    if (sps.uPos == nal::kNotFound || sps.uHeader >= uLen)
         return 0;
-    const ScannedCode pps = FindUnit(pSrc, uLen, static_cast<size_t>(sps.iHeader), kNalPps);
-    if (pps.iPos < 0)
+    const nal::ScannedCode pps = FindUnit(pSrc, uLen, sps.uHeader, kNalPps);
+    if (pps.uPos == nal::kNotFound)
         return 0;
-    const ScannedCode after = ScanPrimed(pSrc, static_cast<size_t>(pps.iHeader), uLen);
-    const int64_t iSpsLen = pps.iPos - sps.iHeader;
-    const int64_t iPpsLen = (after.iPos < 0 ? iSrcLen : after.iPos) - pps.iHeader;
+    const nal::ScannedCode after = nal::ScanPrimed(pSrc, pps.uHeader, uLen);
+    const int64_t iSpsLen = static_cast<int64_t>(pps.uPos - sps.uHeader);
+    const int64_t iPpsLen = static_cast<int64_t>((after.uPos == nal::kNotFound ? uLen : after.uPos) - pps.uHeader);
     if (iSpsLen + iPpsLen + 6 > iDstSize || pDst == nullptr)
         return 0;
     pDst[0] = 1;
-    PutBE16(pDst + 1, static_cast<uint32_t>(iSpsLen) & 0xFFFFu);
-    memcpy(pDst + 3, pSrc + sps.iHeader, static_cast<size_t>(iSpsLen));
+    nal::WriteBE(pDst + 1, static_cast<uint32_t>(iSpsLen) & 0xFFFFu, 2);
+    memcpy(pDst + 3, pSrc + sps.uHeader, static_cast<size_t>(iSpsLen));
     uint8_t *pPps = pDst + 3 + iSpsLen;
     pPps[0] = 1;
-    PutBE16(pPps + 1, static_cast<uint32_t>(iPpsLen) & 0xFFFFu);
-    memcpy(pPps + 3, pSrc + pps.iHeader, static_cast<size_t>(iPpsLen));
+    nal::WriteBE(pPps + 1, static_cast<uint32_t>(iPpsLen) & 0xFFFFu, 2);
+    memcpy(pPps + 3, pSrc + pps.uHeader, static_cast<size_t>(iPpsLen));
     return static_cast<int32_t>(iSpsLen + iPpsLen + 6);
 }
 
@@ -278,23 +200,23 @@ const uint8_t *NalConfigStream(const uint8_t *pData, int32_t iLen, int32_t iSize
 {
     if (piConfigLen)
         *piConfigLen = 0;
-    if (pData == nullptr || !ValidNalLengthSize(iSize))
+    if (pData == nullptr || !nal::ValidLengthSize(iSize))
         return nullptr;
     int64_t iRun = -1;
-    int32_t iPos = 0;
+    size_t uPos = 0;
     for (;;) {
-        const uint8_t h = ByteAt(pData, iLen, int64_t{iPos} + iSize);
+        const uint8_t h = nal::ByteAt(pData, iLen, static_cast<int64_t>(uPos) + iSize);
         if (h & kForbiddenBit)
             return nullptr;
-        const uint32_t t = h & kTypeMask;
+        const uint32_t t = NalType(h);
         if (IsSlice(t))
-            return iRun < 0 ? nullptr : Run(pData, iRun, iPos, piConfigLen);
+            return iRun < 0 ? nullptr : Run(pData, iRun, static_cast<int64_t>(uPos), piConfigLen);
         if (IsConfigUnit(t) && iRun < 0)
-            iRun = iPos;
-        if (int64_t{iPos} >= int64_t{iLen} - 1)
+            iRun = static_cast<int64_t>(uPos);
+        if (static_cast<int64_t>(uPos) >= int64_t{iLen} - 1)
             return nullptr;
-        iPos = NextNal(pData, iLen, iPos, iSize);
-        if (iPos < 0)
+        uPos = nal::NextLengthField(pData, static_cast<size_t>(iLen), uPos, iSize);
+        if (uPos == nal::kNotFound)
             return iRun < 0 ? nullptr : Run(pData, iRun, iLen, piConfigLen);
     }
 }
@@ -309,20 +231,20 @@ const uint8_t *AnnexBConfigStream(const uint8_t *pData, int32_t iLen, int32_t *p
     int64_t iRun = -1;
     size_t uFrom = 0;
     for (;;) {
-        const ScannedCode c = ScanPrimed(pData, uFrom, uLen);
-        if (c.iPos < 0)
+        const nal::ScannedCode c = nal::ScanPrimed(pData, uFrom, uLen);
+        if (c.uPos == nal::kNotFound)
             return iRun < 0 ? nullptr : Run(pData, iRun, iLen, piConfigLen);
-        const uint8_t h = ByteAt(pData, iLen, c.iHeader);
+        const uint8_t h = nal::ByteAt(pData, iLen, static_cast<int64_t>(c.uHeader));
         if ((h & kForbiddenBit) == 0) {
-            const uint32_t t = h & kTypeMask;
+            const uint32_t t = NalType(h);
             if (IsSlice(t))
-                return iRun < 0 ? nullptr : Run(pData, iRun, c.iPos, piConfigLen);
+                return iRun < 0 ? nullptr : Run(pData, iRun, static_cast<int64_t>(c.uPos), piConfigLen);
             if (IsConfigUnit(t) && iRun < 0)
-                iRun = c.iPos;
+                iRun = static_cast<int64_t>(c.uPos);
         }
-        if (c.iHeader >= int64_t{iLen} - 1)
+        if (static_cast<int64_t>(c.uHeader) >= int64_t{iLen} - 1)
             return nullptr;
-        uFrom = static_cast<size_t>(c.iHeader);
+        uFrom = c.uHeader;
     }
 }
 

@@ -12,9 +12,7 @@ int32_t CheckFormat(const uint8_t *pData, int32_t iLen) noexcept
 {
     if (iLen < 4 || pData == nullptr)
         return CAL_AVC_FORMAT_UNDETERMINED;
-    if (pData[0] == 0 && pData[1] == 0 && (pData[2] == 1 || (pData[2] == 0 && pData[3] == 1)))
-        return CAL_AVC_FORMAT_ANNEXB;
-    return CAL_AVC_FORMAT_NAL;
+    return nal::StartCodeLengthAt(pData, iLen, 0) != 0 ? CAL_AVC_FORMAT_ANNEXB : CAL_AVC_FORMAT_NAL;
 }
 
 int32_t FindStartCode(const uint8_t *pData, int32_t iLen) noexcept
@@ -22,7 +20,17 @@ int32_t FindStartCode(const uint8_t *pData, int32_t iLen) noexcept
     if (iLen < 4 || pData == nullptr)
         return -1;
     const size_t uLen = static_cast<size_t>(iLen);
-    return static_cast<int32_t>(FindCode(pData, 0, uLen - 3, uLen));
+    const size_t uCode = nal::FindCode(pData, 0, uLen - 3, uLen);
+    return uCode == nal::kNotFound ? -1 : static_cast<int32_t>(uCode);
+}
+
+// _NEXT_NAL_: the documented -1 for every way out of the walk.
+int32_t NextNal(const uint8_t *pBuf, int32_t iLen, int32_t iPos, int32_t iSize) noexcept
+{
+    if (pBuf == nullptr || !nal::ValidLengthSize(iSize) || iPos < 0 || iPos >= iLen)
+        return -1;
+    const size_t uNext = nal::NextLengthField(pBuf, static_cast<size_t>(iLen), static_cast<size_t>(iPos), iSize);
+    return uNext == nal::kNotFound ? -1 : static_cast<int32_t>(uNext);
 }
 
 // The code in the position of frame_num (fourth ue(v) after the NAL header), read from the
@@ -40,7 +48,7 @@ uint32_t SliceKey(const uint8_t *pData, int32_t iLen, int32_t iAt) noexcept
 
 int32_t GetOneFrame(const uint8_t *pData, int32_t iLen) noexcept
 {
-    if (iLen <= 5 || pData == nullptr || StartCodeLengthAt(pData, iLen, 0) == 0)
+    if (iLen <= 5 || pData == nullptr || nal::StartCodeLengthAt(pData, iLen, 0) == 0)
         return iLen;
     const size_t uLen = static_cast<size_t>(iLen);
     const size_t uLimit = uLen - 5; // a code begins below length - 5
@@ -48,12 +56,11 @@ int32_t GetOneFrame(const uint8_t *pData, int32_t iLen) noexcept
     bool bHavePrevious = false;
     size_t p = 0;
     for (;;) {
-        const int64_t iCode = FindCode(pData, p, uLimit, uLen);
-        if (iCode < 0)
+        p = nal::FindCode(pData, p, uLimit, uLen);
+        if (p == nal::kNotFound)
             return iLen;
-        p = static_cast<size_t>(iCode);
-        const int32_t s = StartCodeLengthAt(pData, iLen, iCode);
-        const uint32_t t = pData[p + s] & kTypeMask;
+        const int32_t s = nal::StartCodeLengthAt(pData, iLen, static_cast<int64_t>(p));
+        const uint32_t t = NalType(pData[p + s]);
         if (t == kNalSliceNonIdr || t == kNalPartitionA || t == kNalSliceIdr || t == kNalAuxSlice) {
             const uint32_t uKey = SliceKey(pData, iLen, static_cast<int32_t>(p + s + 1));
             if ((bHavePrevious && uKey != uPrevious) || uKey == 0xFFFFFFFFu)

@@ -3,98 +3,14 @@
 // unit found in a single unit, start-code framed data or an AVC decoder configuration record.
 #include <cstddef>
 #include <cstdint>
-#include <iterator>
 
 #include <vorcal/video_tools.h>
 
 #include "tools/avc_nal.hpp"
+#include "tools/rbsp_reader.hpp"
 
 namespace vorcal::tools::avc {
 namespace {
-
-// Reads the RBSP of one NAL unit MSB first: a 0x03 after two zero bytes is an
-// emulation-prevention byte and is dropped (ITU-T H.264 7.4.1). Past the end every bit reads as
-// 0. The first failure is remembered, a read past the end or a value out of range, so that
-// zeros read past the end are not taken for a malformed field nor a broken field for a cut.
-class RbspReader {
-public:
-    RbspReader(const uint8_t *pData, size_t uLen) noexcept : p_(pData), n_(uLen) {}
-
-    // The next n bits (n <= 32), right-aligned.
-    uint32_t Bits(uint32_t n) noexcept
-    {
-        uint64_t v = 0;
-        while (n > 0) {
-            if (left_ == 0 && !Fetch()) {
-                overrun_ = overrun_ || !bad_;
-                return static_cast<uint32_t>(v << n);
-            }
-            const uint32_t uTake = n < left_ ? n : left_;
-            left_ -= uTake;
-            v = (v << uTake) | ((cur_ >> left_) & ((1u << uTake) - 1));
-            n -= uTake;
-        }
-        return static_cast<uint32_t>(v);
-    }
-    uint32_t Bit() noexcept { return Bits(1); }
-
-    // ue(v), ITU-T H.264 9.1: up to 31 leading zeros (values up to 2^32 - 2); more is an error.
-    uint32_t UE() noexcept
-    {
-        uint32_t uZeros = 0;
-        while (Bit() == 0) {
-            if (++uZeros > 31 || Failed()) {
-                Require(false);
-                return 0;
-            }
-        }
-        return static_cast<uint32_t>((uint64_t{1} << uZeros) - 1 + Bits(uZeros));
-    }
-    // se(v), ITU-T H.264 9.1.1.
-    int64_t SE() noexcept
-    {
-        const uint32_t k = UE();
-        return (k & 1) ? int64_t{k / 2} + 1 : -int64_t{k / 2};
-    }
-
-    // A ue(v) value checked against its largest legal value.
-    uint32_t UE(uint32_t uMax) noexcept
-    {
-        const uint32_t v = UE();
-        Require(v <= uMax);
-        return v;
-    }
-    void Require(bool bOK) noexcept { bad_ = bad_ || (!bOK && !overrun_); }
-    bool Failed() const noexcept { return bad_ || overrun_; }
-    int32_t Error() const noexcept
-    {
-        return overrun_ ? CAL_AVC_SPS_ERR_TRUNCATED : bad_ ? CAL_AVC_SPS_ERR_MALFORMED : CAL_AVC_SPS_OK;
-    }
-
-private:
-    bool Fetch() noexcept
-    {
-        if (pos_ < n_ && zeros_ >= 2 && p_[pos_] == 0x03) {
-            ++pos_;
-            zeros_ = 0;
-        }
-        if (pos_ >= n_)
-            return false;
-        cur_ = p_[pos_++];
-        zeros_ = cur_ == 0 ? zeros_ + 1 : 0;
-        left_ = 8;
-        return true;
-    }
-
-    const uint8_t *p_;
-    size_t n_;
-    size_t pos_ = 0;
-    uint32_t cur_ = 0;
-    uint32_t left_ = 0;  // unread bits of cur_
-    uint32_t zeros_ = 0; // zero bytes just read
-    bool overrun_ = false;
-    bool bad_ = false;
-};
 
 // Profiles whose SPS carries chroma_format_idc, the bit depths and the scaling matrix.
 bool HasChromaFields(uint32_t uProfileIdc) noexcept
@@ -136,25 +52,11 @@ void SkipHrd(RbspReader &r) noexcept
     r.Bits(20); // four delay and offset lengths of 5 bits
 }
 
-// Table E-1: the sample aspect ratios of aspect_ratio_idc 1 to 16.
-constexpr uint16_t kSar[17][2] = {{0, 0},   {1, 1},   {12, 11}, {10, 11}, {16, 11}, {40, 33},
-                                  {24, 11}, {20, 11}, {32, 11}, {80, 33}, {18, 11}, {15, 11},
-                                  {64, 33}, {160, 99}, {4, 3},  {3, 2},   {2, 1}};
-constexpr uint32_t kExtendedSar = 255;
-
 // vui_parameters(), E.1.1.
 void ParseVui(RbspReader &r, CALAVCSPS &s) noexcept
 {
-    if (r.Bit()) { // aspect_ratio_info_present_flag
-        const uint32_t uIdc = r.Bits(8);
-        if (uIdc == kExtendedSar) {
-            s.uSarNum = r.Bits(16);
-            s.uSarDen = r.Bits(16);
-        } else if (uIdc < std::size(kSar)) { // 0 Unspecified; 17-254 reserved read as unspecified
-            s.uSarNum = kSar[uIdc][0];
-            s.uSarDen = kSar[uIdc][1];
-        }
-    }
+    if (r.Bit()) // aspect_ratio_info_present_flag
+        ReadSampleAspectRatio(r, &s.uSarNum, &s.uSarDen);
     if (r.Bit()) // overscan_info_present_flag
         r.Bit(); // overscan_appropriate_flag
     if (r.Bit()) { // video_signal_type_present_flag
@@ -228,6 +130,18 @@ bool ApplySize(CALAVCSPS &s, uint32_t uWidthMbsMinus1, uint32_t uHeightMapUnitsM
 }
 
 // seq_parameter_set_data(), the reader standing just after the NAL header byte.
+int32_t ResultOf(const RbspReader &r) noexcept
+{
+    switch (r.Error()) {
+    case RbspError::kTruncated:
+        return CAL_AVC_SPS_ERR_TRUNCATED;
+    case RbspError::kMalformed:
+        return CAL_AVC_SPS_ERR_MALFORMED;
+    default:
+        return CAL_AVC_SPS_OK;
+    }
+}
+
 int32_t ParseBody(RbspReader &r, CALAVCSPS &s) noexcept
 {
     s.uProfileIdc = r.Bits(8);
@@ -254,7 +168,7 @@ int32_t ParseBody(RbspReader &r, CALAVCSPS &s) noexcept
     s.uLog2MaxFrameNum = r.UE(kMaxLog2Minus4) + 4;
     s.uPicOrderCntType = r.UE(2);
     if (r.Failed())
-        return r.Error();
+        return ResultOf(r);
     if (s.uPicOrderCntType == 0) {
         r.UE(kMaxLog2Minus4); // log2_max_pic_order_cnt_lsb_minus4
     } else if (s.uPicOrderCntType == 1) {
@@ -281,7 +195,7 @@ int32_t ParseBody(RbspReader &r, CALAVCSPS &s) noexcept
     if (r.Bit()) // vui_parameters_present_flag
         ParseVui(r, s);
     if (r.Failed())
-        return r.Error();
+        return ResultOf(r);
     return ApplySize(s, uWidthMbsMinus1, uHeightMapUnitsMinus1, uCrop) ? CAL_AVC_SPS_OK : CAL_AVC_SPS_ERR_MALFORMED;
 }
 
@@ -317,13 +231,13 @@ Unit SpsOfStartCodes(const uint8_t *p, size_t uLen) noexcept
 {
     size_t uFrom = 0;
     for (;;) {
-        const size_t q = FindStartCodePrefix(p, uFrom, uLen);
-        if (q + 3 >= uLen)
+        const size_t q = nal::FindPrefix(p, uFrom, uLen);
+        if (q == nal::kNotFound || q + 3 >= uLen)
             return {};
         const size_t uHeader = q + 3;
         if (IsSpsHeader(p[uHeader])) {
-            const size_t uEnd = FindStartCodePrefix(p, uHeader, uLen);
-            return {p + uHeader, uEnd - uHeader, CAL_AVC_SPS_OK};
+            const size_t uEnd = nal::FindPrefix(p, uHeader, uLen);
+            return {p + uHeader, (uEnd == nal::kNotFound ? uLen : uEnd) - uHeader, CAL_AVC_SPS_OK};
         }
         uFrom = uHeader;
     }

@@ -94,7 +94,7 @@ uint32_t GetSPSInfo(const uint8_t *pData, int32_t iLen, CALSPSInfo *pInfo) noexc
     CALSPSInfo scratch{};
     CALSPSInfo &info = pInfo ? *pInfo : scratch;
     // The data is taken to begin with a start code: 4 bytes for 00 00 00 01, else any 3.
-    int32_t iSkip = StartCodeLengthAt(pData, iLen, 0) == 4 ? 4 : 3;
+    int32_t iSkip = nal::StartCodeLengthAt(pData, iLen, 0) == 4 ? 4 : 3;
     const uint8_t *pUnit = pData;
     int32_t iRemaining = iLen;
     for (;;) {
@@ -114,7 +114,7 @@ uint32_t GetSPSInfo(const uint8_t *pData, int32_t iLen, CALSPSInfo *pInfo) noexc
         if (iRemaining <= 4)
             return kSpsTooShort;
         pUnit += o;
-        iSkip = StartCodeLengthAt(pUnit, iRemaining, 0) == 4 ? 4 : 3;
+        iSkip = nal::StartCodeLengthAt(pUnit, iRemaining, 0) == 4 ? 4 : 3;
     }
 }
 

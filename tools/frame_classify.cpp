@@ -11,38 +11,19 @@
 #include <vorcal/wrapper.h>
 
 #include "core/sal.hpp"
+#include "tools/avc_nal.hpp"
 #include "tools/bit_reader.hpp"
-#include "tools/start_code.hpp"
+#include "tools/nal_framing.hpp"
 
 namespace vorcal::tools::classify {
 namespace {
 
 constexpr uint8_t kVopStartCode = 0xB6;     // ISO/IEC 14496-2 6.2.5
 constexpr uint8_t kPictureStartCode = 0x00; // ISO/IEC 13818-2 6.2.3
-constexpr size_t kNotFound = SIZE_MAX;
-
-constexpr uint32_t kNalSliceNonIdr = 1;
-constexpr uint32_t kNalSliceIdr = 5;
 
 bool IsMpeg4Visual(uint32_t uOTI)
 {
     return uOTI == CAL_OTI_MPEG4_VISUAL || uOTI == CAL_OTI_MPEG4_VISUAL_2;
-}
-
-// Offset of the first start code 00 00 01 <uCode> that begins at an offset from uFrom to uLast,
-// or kNotFound. The caller guarantees uLast + 3 < the frame length, so the code byte is inside.
-size_t FindCode(const uint8_t *pData, size_t uFrom, size_t uLast, uint8_t uCode)
-{
-    const size_t uEnd = uLast + 3;
-    for (;;) {
-        const size_t i = FindStartCodePrefix(pData, uFrom, uEnd);
-        if (i == uEnd)
-            return kNotFound;
-        if (pData[i + 3] == uCode)
-            return i;
-        // 00 00 01 xx: neither xx's offset nor the 01's can start another prefix.
-        uFrom = i + 3;
-    }
 }
 
 // The two bits of vop_coding_type after the first VOP start code among offsets 0..length-6,
@@ -51,8 +32,8 @@ int FirstVopCodingType(const uint8_t *pFrame, int32_t iLen)
 {
     if (pFrame == nullptr || iLen <= 5)
         return -1;
-    const size_t i = FindCode(pFrame, 0, size_t(iLen) - 6, kVopStartCode);
-    return i == kNotFound ? -1 : pFrame[i + 4] >> 6;
+    const size_t i = nal::FindPrefixWith(pFrame, 0, size_t(iLen) - 6, kVopStartCode);
+    return i == nal::kNotFound ? -1 : pFrame[i + 4] >> 6;
 }
 
 // H.263 (ITU-T H.263 5.1.1-5.1.4): 22-bit PSC, then PTYPE; source format 7 is PLUSPTYPE.
@@ -102,8 +83,8 @@ int IsIntraMpeg12(const uint8_t *p, int32_t iLen)
     if (iLen <= 6)
         return 0;
     const size_t uLast = size_t(iLen) - 7;
-    for (size_t i = FindCode(p, 0, uLast, kPictureStartCode); i != kNotFound;
-         i = FindCode(p, i + 4, uLast, kPictureStartCode)) {
+    for (size_t i = nal::FindPrefixWith(p, 0, uLast, kPictureStartCode); i != nal::kNotFound;
+         i = nal::FindPrefixWith(p, i + 4, uLast, kPictureStartCode)) {
         if (((p[i + 5] >> 3) & 7) == 1)
             return 1;
     }
@@ -147,8 +128,8 @@ bool IsISlice(const uint8_t *pAfterHeader)
 // More than 4 bytes follow the header byte's position (checked by the caller).
 bool IsIntraNal(const uint8_t *pHeader)
 {
-    const uint32_t uType = pHeader[0] & 0x1Fu;
-    return uType == kNalSliceIdr || (uType == kNalSliceNonIdr && IsISlice(pHeader + 1));
+    const uint32_t uType = avc::NalType(pHeader[0]);
+    return uType == avc::kNalSliceIdr || (uType == avc::kNalSliceNonIdr && IsISlice(pHeader + 1));
 }
 
 // Start-code framed H.264. A start code at offset p (0..length-6, 00 00 00 01 tested before
@@ -161,8 +142,8 @@ int IsIntraH264StartCodes(const uint8_t *p, int32_t iLen)
         return 0;
     const size_t uEnd = size_t(iLen) - 5; // prefix offsets 0..length-8
     for (size_t uFrom = 0;;) {
-        const size_t i = FindStartCodePrefix(p, uFrom, uEnd);
-        if (i == uEnd)
+        const size_t i = nal::FindPrefix(p, uFrom, uEnd);
+        if (i == nal::kNotFound)
             return 0;
         if (IsIntraNal(p + i + 3))
             return 1;
@@ -170,26 +151,23 @@ int IsIntraH264StartCodes(const uint8_t *p, int32_t iLen)
     }
 }
 
-// Length-prefixed H.264 with NAL length size 1 to 4; sizes 0 and above 4 are refused. Offsets
-// are computed in 64 bits so that a length field pointing beyond the frame ends the walk.
+// Length-prefixed H.264 with NAL length size 1 to 4; sizes 0 and above 4 are refused. The walk
+// goes on while a whole length field and at least one byte after it lie inside the frame, so a
+// length field pointing beyond the frame ends it.
 int IsIntraH264LengthPrefixed(const uint8_t *p, int32_t iLen, CALParam uSize)
 {
     if (uSize == 0 || uSize > 4)
         return 0;
-    const int64_t iSize = int64_t(uSize);
-    const int64_t iEnd = int64_t(iLen) - iSize; // last offset + 1 at which a length field fits
-    if (iEnd <= 0)
+    const int32_t iSize = int32_t(uSize);
+    if (int64_t(iLen) - iSize <= 0)
         return 0;
-    int64_t iOffset = 0;
-    for (;;) {
-        const uint8_t *pField = p + iOffset;
-        if (iLen - iOffset - iSize > 4 && IsIntraNal(pField + iSize))
+    const size_t uLen = size_t(iLen);
+    const size_t uEnd = uLen - size_t(iSize); // last offset + 1 at which a length field fits
+    for (size_t uOffset = 0;;) {
+        if (uLen - uOffset - size_t(iSize) > 4 && IsIntraNal(p + uOffset + iSize))
             return 1;
-        uint32_t uNalLen = 0;
-        for (int64_t k = 0; k < iSize; ++k)
-            uNalLen = (uNalLen << 8) | pField[k];
-        iOffset += iSize + int64_t(uNalLen);
-        if (iOffset >= iEnd)
+        uOffset = nal::NextLengthField(p, uLen, uOffset, iSize);
+        if (uOffset == nal::kNotFound || uOffset >= uEnd)
             return 0;
     }
 }
@@ -198,11 +176,11 @@ int IsIntraH264LengthPrefixed(const uint8_t *p, int32_t iLen, CALParam uSize)
 int IsIntraH264(const uint8_t *p, int32_t iLen, CALParam uNalLengthSize)
 {
     bool bStartCode = false;
-    if (iLen > 4 && p[0] == 0 && p[1] == 0 && ((p[2] == 0 && p[3] == 1) || p[2] == 1)) {
+    if (iLen > 4 && nal::StartCodeLengthAt(p, iLen, 0) != 0) {
         bStartCode = true;
         VORCAL_TRACE_PLAIN("[vorCAL_Tools ]StartCode(0x%x, 0x%x, 0x%x, 0x%x)\n", 0u, 0u, unsigned(p[2]),
                            unsigned(p[3]));
-    } else if (iLen == 4 && p[0] == 0 && p[1] == 0 && p[2] == 1) {
+    } else if (iLen == 4 && nal::StartCodeLengthAt(p, iLen, 0) == 3) {
         bStartCode = true;
         VORCAL_TRACE_PLAIN("[vorCAL_Tools ]StartCode(0x%x, 0x%x, 0x%x)\n", 0u, 0u, unsigned(p[2]));
     }
@@ -260,19 +238,16 @@ int IsValidH264(const uint8_t *p, int32_t iLen)
                      sal::Hex32(p));
         return 0;
     }
-    uint32_t uType;
-    if (p[0] == 0 && p[1] == 0 && p[2] == 1)
-        uType = p[3] & 0x1Fu;
-    else if (p[0] == 0 && p[1] == 0 && p[2] == 0 && p[3] == 1)
-        uType = p[4] & 0x1Fu;
-    else
+    const int32_t iCode = nal::StartCodeLengthAt(p, iLen, 0);
+    if (iCode == 0)
         return 1;
+    const uint32_t uType = avc::NalType(p[iCode]);
     switch (uType) {
-    case 1:
-    case 5:
-    case 7:
-    case 8:
-    case 12:
+    case avc::kNalSliceNonIdr:
+    case avc::kNalSliceIdr:
+    case avc::kNalSps:
+    case avc::kNalPps:
+    case avc::kNalFiller:
         return 1;
     default:
         VORCAL_TRACE(kTraceText, 0, "[CAL_Tools %d] Invalid NAL Type(%d).(%d)\n", __LINE__, 1, int(uType));
@@ -304,8 +279,8 @@ const uint8_t *FindVop(const uint8_t *p, int32_t iLen, int32_t *piRemaining)
 {
     if (p == nullptr || iLen <= 4)
         return nullptr;
-    const size_t i = FindCode(p, 0, size_t(iLen) - 5, kVopStartCode);
-    if (i == kNotFound)
+    const size_t i = nal::FindPrefixWith(p, 0, size_t(iLen) - 5, kVopStartCode);
+    if (i == nal::kNotFound)
         return nullptr;
     if (piRemaining != nullptr)
         *piRemaining = iLen - int32_t(i);

@@ -1,4 +1,6 @@
-// Video decoder adaptation: the layer's own work for H.264, MPEG-4 Visual and H.263 streams.
+// Video decoder adaptation: the layer's own work for H.264, HEVC, MPEG-4 Visual and H.263
+// streams. H.264 and HEVC share the frame adaptation (parameter-set removal, framing conversion
+// into the intermediate buffer) through the operations of each codec.
 //
 // Input the layer cannot read is never handed to a tool: a configuration or frame with a null
 // pointer or a negative length is passed to the codec as the engine gave it (for Init the
@@ -72,8 +74,8 @@ bool ReserveIntermediate(CALCodec *hCodec, int32_t iLen) noexcept
 }
 
 // The stream-aware mode (CAL_PROP_TRUST_CONFIGURATION answered 1) takes the frame framing from
-// the configuration. An H.264 instance never has an AMR frame type (the lock runs for AMR OTIs
-// only), so the mode keeps the framing in m_uAMRFrameType and the instance record stays as
+// the configuration. An H.264 or HEVC instance never has an AMR frame type (the lock runs for AMR
+// OTIs only), so the mode keeps the framing in m_uAMRFrameType and the instance record stays as
 // documented. 0 leaves the framing to the format test of each frame.
 struct ConfigFraming {
     int32_t iFormat = 0;
@@ -90,6 +92,34 @@ ConfigFraming FramingOfConfiguration(const VideoInitArgs &args) noexcept
     // A configuration record tells its own length size; a parameter-set list does not.
     const int32_t iRecordSize = tools::avc::ConfigRecordNalLengthSize(args.pConfig, args.iConfigLen);
     return {CAL_AVC_FORMAT_NAL, iRecordSize ? static_cast<uint32_t>(iRecordSize) : args.uNALLengthSize};
+}
+
+// The same for HEVC: start-code framing, or an hvcC record with its lengthSizeMinusOne + 1.
+ConfigFraming FramingOfHevcConfiguration(const VideoInitArgs &args) noexcept
+{
+    constexpr int32_t kMinConfigLen = 4;
+    if (!Readable(args.pConfig, args.iConfigLen) || args.iConfigLen < kMinConfigLen)
+        return {};
+    if (vorCALTools_HEVC_CheckFormat(args.pConfig, args.iConfigLen) == CAL_AVC_FORMAT_ANNEXB)
+        return {CAL_AVC_FORMAT_ANNEXB, args.uNALLengthSize};
+    CALHEVCConfig record;
+    const bool bRecord = vorCALTools_HEVC_ParseHvcC(args.pConfig, args.iConfigLen, &record) == CAL_HEVC_OK;
+    return {CAL_AVC_FORMAT_NAL, bRecord ? record.uNALLengthSize : args.uNALLengthSize};
+}
+
+// The stream-aware mode for an instance that Decode adapts as iOTI: the framing of the frames
+// from the configuration, kept in m_uAMRFrameType; a record's length size in m_uH264NALSize.
+ConfigFraming TrustConfiguration(CALCodec *hCodec, const VideoInitArgs &args, uint32_t uOTI, bool bTrusted) noexcept
+{
+    ConfigFraming framing;
+    if (hCodec->m_uCodecObjectTypeIndication != uOTI)
+        return framing;
+    if (bTrusted)
+        framing = uOTI == CAL_OTI_HEVC ? FramingOfHevcConfiguration(args) : FramingOfConfiguration(args);
+    hCodec->m_uAMRFrameType = static_cast<uint32_t>(framing.iFormat);
+    if (framing.iFormat == CAL_AVC_FORMAT_NAL)
+        hCodec->m_uH264NALSize = framing.uNALSize;
+    return framing;
 }
 
 inline int32_t TrustedFraming(const CALCodec *hCodec) noexcept
@@ -121,6 +151,99 @@ VideoInitPlan FailInit(CALCodec *hCodec, uint8_t *pTemporaryConfig) noexcept
     return Answer(-1);
 }
 
+// What the H.264 and HEVC adaptations differ in: the tools they call and the names in traces.
+struct NalCodecOps {
+    bool bHevc;
+    int32_t (*CheckFormat)(const uint8_t *pData, int32_t iLen) noexcept;
+    // The parameter-set run in front of the first slice, for the framing given, or null.
+    const uint8_t *(*ConfigRun)(const uint8_t *pData, int32_t iLen, bool bAnnexB, int32_t iNALSize,
+                                int32_t *piRunLen) noexcept;
+    // A frame of framing iFormat converted into pDst: the bytes written, or -1.
+    int32_t (*Convert)(uint8_t *pDst, int32_t iDstSize, const uint8_t *pSrc, int32_t iLen, int32_t iNALSize,
+                       int32_t iFormat) noexcept;
+    // The bytes Convert writes given room enough, or -1 when it fails for another reason.
+    int64_t (*ConvertedSize)(const uint8_t *pSrc, int32_t iLen, int32_t iNALSize, int32_t iFormat) noexcept;
+};
+
+int32_t AvcCheckFormat(const uint8_t *pData, int32_t iLen) noexcept
+{
+    return vorCALTools_AVC_CheckFormat(pData, iLen);
+}
+
+const uint8_t *AvcConfigRun(const uint8_t *pData, int32_t iLen, bool bAnnexB, int32_t iNALSize, int32_t *piRunLen) noexcept
+{
+    return bAnnexB ? vorCALTools_AVC_ANNEXB_GetConfigStream(pData, iLen, piRunLen)
+                   : vorCALTools_AVC_NAL_GetConfigStream(pData, iLen, iNALSize, piRunLen);
+}
+
+constexpr NalCodecOps kAvc = {false, AvcCheckFormat, AvcConfigRun, tools::avc::ConvertFrame, tools::avc::ConvertedSize};
+
+int32_t HevcCheckFormat(const uint8_t *pData, int32_t iLen) noexcept
+{
+    return vorCALTools_HEVC_CheckFormat(pData, iLen);
+}
+
+const uint8_t *HevcConfigRun(const uint8_t *pData, int32_t iLen, bool bAnnexB, int32_t iNALSize, int32_t *piRunLen) noexcept
+{
+    return vorCALTools_HEVC_GetConfigStream(pData, iLen, bAnnexB ? 0 : iNALSize, piRunLen);
+}
+
+// As for H.264, length-prefixed output has 4-byte length fields whatever size the input used.
+constexpr int32_t kOutputLengthSize = 4;
+
+int32_t HevcConvert(uint8_t *pDst, int32_t iDstSize, const uint8_t *pSrc, int32_t iLen, int32_t iNALSize,
+                    int32_t iFormat) noexcept
+{
+    const int32_t iSize = iFormat == CAL_AVC_FORMAT_NAL ? iNALSize : kOutputLengthSize;
+    const int32_t r = vorCALTools_HEVC_ConvertFormat(pDst, iDstSize, pSrc, iLen,
+                                                     iFormat == CAL_AVC_FORMAT_NAL ? CAL_AVC_FORMAT_NAL : CAL_AVC_FORMAT_ANNEXB, iSize);
+    return r < 0 ? -1 : r;
+}
+
+int64_t HevcConvertedSize(const uint8_t *pSrc, int32_t iLen, int32_t iNALSize, int32_t iFormat) noexcept
+{
+    return HevcConvert(nullptr, 0, pSrc, iLen, iNALSize, iFormat);
+}
+
+constexpr NalCodecOps kHevc = {true, HevcCheckFormat, HevcConfigRun, HevcConvert, HevcConvertedSize};
+
+// The enhancement configuration of Init, when its framing is not the wanted one, converted like a
+// frame into the intermediate buffer; a failed conversion leaves the codec a null enhancement
+// configuration with the length as the caller gave it. False when the buffer cannot be had.
+bool ConvertEnhancement(CALCodec *hCodec, VideoInitArgs &args, int32_t iWanted, const NalCodecOps &ops) noexcept
+{
+    if (!Readable(args.pConfigEnhance, args.iEnhLen))
+        return true;
+    const int32_t iFormat = ops.CheckFormat(args.pConfigEnhance, args.iEnhLen);
+    if (iFormat == iWanted)
+        return true;
+    if (!ReserveIntermediate(hCodec, args.iEnhLen))
+        return false;
+    const int32_t iNewLen = ops.Convert(hCodec->m_pIntermediateFrame, args.iEnhLen + kIntermediateHeadroom,
+                                        args.pConfigEnhance, args.iEnhLen, static_cast<int32_t>(args.uNALLengthSize), iFormat);
+    if (iNewLen == -1) {
+        // The H.264 message names the format test, although the conversion failed.
+        if (ops.bHevc)
+            VORCAL_TRACE(kTraceError, 0, "[CAL_Wrapper %d] vorCALTools_HEVC_ConvertFormat failed\n", __LINE__);
+        else
+            VORCAL_TRACE(kTraceError, 0, "[CAL_Wrapper %d] vorCALTools_AVC_CheckFormat failed\n", __LINE__);
+        args.pConfigEnhance = nullptr;
+        return true;
+    }
+    args.pConfigEnhance = hCodec->m_pIntermediateFrame;
+    args.iEnhLen = iNewLen;
+    if (ops.bHevc)
+        return true;
+    VORCAL_TRACE(kTraceH264Adapt, 0, "[CAL_Wrapper %d] vorCALTools_AVC_CheckFormat iEnhLen = %d, iNewDataLen = %d\n",
+                 __LINE__, iNewLen, iNewLen);
+    VORCAL_TRACE(kTraceH264Adapt, 0,
+                 "[CAL_Wrapper %d] vorCALTools_AVC_CheckFormat pConfigEnhance = 0x%x, "
+                 "m_pIntermediateFrame = 0x%x, m_uH264NALSize = %d\n",
+                 __LINE__, sal::Hex32(args.pConfigEnhance), sal::Hex32(hCodec->m_pIntermediateFrame),
+                 static_cast<int>(hCodec->m_uH264NALSize));
+    return true;
+}
+
 VideoInitPlan PrepareH264Init(CALCodec *hCodec, VideoInitArgs &args) noexcept
 {
     // The configuration as the caller passed it, parsed at most once for size and profile.
@@ -137,14 +260,7 @@ VideoInitPlan PrepareH264Init(CALCodec *hCodec, VideoInitArgs &args) noexcept
     };
 
     const bool bTrusted = VideoPropertyIs(hCodec, CAL_PROP_TRUST_CONFIGURATION, 1);
-    ConfigFraming framing;
-    if (hCodec->m_uCodecObjectTypeIndication == CAL_OTI_H264) { // the instance Decode adapts as H.264
-        if (bTrusted)
-            framing = FramingOfConfiguration(args);
-        hCodec->m_uAMRFrameType = static_cast<uint32_t>(framing.iFormat);
-        if (framing.iFormat == CAL_AVC_FORMAT_NAL)
-            hCodec->m_uH264NALSize = framing.uNALSize;
-    }
+    const ConfigFraming framing = TrustConfiguration(hCodec, args, CAL_OTI_H264, bTrusted);
 
     if (VideoPropertyIs(hCodec, CAL_PROP_STREAM_PARAMETERS, 1)) {
         CALAVCSPS full;
@@ -189,31 +305,56 @@ VideoInitPlan PrepareH264Init(CALCodec *hCodec, VideoInitArgs &args) noexcept
     }
 
     // Enhancement configuration: converted into the intermediate buffer.
-    if (Readable(args.pConfigEnhance, args.iEnhLen) &&
-        vorCALTools_AVC_CheckFormat(args.pConfigEnhance, args.iEnhLen) != iWanted) {
-        if (!ReserveIntermediate(hCodec, args.iEnhLen))
-            return FailInit(hCodec, plan.pTemporaryConfig);
-        const int32_t iNewLen = vorCALTools_AVC_ConvertFormat(
-            hCodec->m_pIntermediateFrame, args.iEnhLen + kIntermediateHeadroom, args.pConfigEnhance,
-            args.iEnhLen, static_cast<int32_t>(args.uNALLengthSize));
-        if (iNewLen == -1) {
-            // The message names the format test, although the conversion failed; the codec
-            // gets no enhancement configuration but the length as the caller gave it.
-            VORCAL_TRACE(kTraceError, 0, "[CAL_Wrapper %d] vorCALTools_AVC_CheckFormat failed\n", __LINE__);
-            args.pConfigEnhance = nullptr;
+    if (!ConvertEnhancement(hCodec, args, iWanted, kAvc))
+        return FailInit(hCodec, plan.pTemporaryConfig);
+    return plan;
+}
+
+// HEVC: the picture size from the SPS (the display size, from any configuration), the framing
+// of the configuration and of the enhancement configuration; nothing is refused.
+VideoInitPlan PrepareHEVCInit(CALCodec *hCodec, VideoInitArgs &args) noexcept
+{
+    const bool bTrusted = VideoPropertyIs(hCodec, CAL_PROP_TRUST_CONFIGURATION, 1);
+    const ConfigFraming framing = TrustConfiguration(hCodec, args, CAL_OTI_HEVC, bTrusted);
+
+    CALHEVCSPS sps;
+    if (VideoPropertyIs(hCodec, CAL_PROP_STREAM_PARAMETERS, 1) && Readable(args.pConfig, args.iConfigLen) &&
+        vorCALTools_HEVC_ParseSPS(args.pConfig, args.iConfigLen, &sps) == CAL_HEVC_OK)
+        StoreSize(args, sps.uWidth, sps.uHeight);
+
+    uint32_t uWanted = 0;
+    if (!VideoPropertyAnswered(hCodec, CAL_PROP_H264_CONFIG_FORMAT, &uWanted))
+        return {};
+    if (framing.iFormat != CAL_AVC_FORMAT_NAL) // a record's own length size stays
+        hCodec->m_uH264NALSize = args.uNALLengthSize;
+    if (!IsAVCFormat(uWanted))
+        return {};
+
+    VideoInitPlan plan;
+    const int32_t iWanted = static_cast<int32_t>(uWanted);
+    // Parameter sets: an hvcC record to start codes, or start codes to a record (4-byte lengths,
+    // as frames converted by the layer have), in a temporary buffer of the size it takes. A
+    // configuration that does not convert reaches the codec as given.
+    if (Readable(args.pConfig, args.iConfigLen) && vorCALTools_HEVC_CheckFormat(args.pConfig, args.iConfigLen) != iWanted) {
+        auto ConvertConfig = [&](uint8_t *pDst, int32_t iDstSize) {
+            return iWanted == CAL_AVC_FORMAT_ANNEXB
+                       ? vorCALTools_HEVC_HvcCToAnnexB(pDst, iDstSize, args.pConfig, args.iConfigLen)
+                       : vorCALTools_HEVC_MakeHvcC(pDst, iDstSize, args.pConfig, args.iConfigLen, kOutputLengthSize, 0);
+        };
+        const int32_t iSize = ConvertConfig(nullptr, 0);
+        if (iSize <= 0) {
+            VORCAL_TRACE(kTraceError, 0, "[CAL_Wrapper %d] HEVC configuration not converted (%d)\n", __LINE__,
+                         static_cast<int>(iSize));
         } else {
-            args.pConfigEnhance = hCodec->m_pIntermediateFrame;
-            args.iEnhLen = iNewLen;
-            VORCAL_TRACE(kTraceH264Adapt, 0,
-                         "[CAL_Wrapper %d] vorCALTools_AVC_CheckFormat iEnhLen = %d, iNewDataLen = %d\n",
-                         __LINE__, iNewLen, iNewLen);
-            VORCAL_TRACE(kTraceH264Adapt, 0,
-                         "[CAL_Wrapper %d] vorCALTools_AVC_CheckFormat pConfigEnhance = 0x%x, "
-                         "m_pIntermediateFrame = 0x%x, m_uH264NALSize = %d\n",
-                         __LINE__, sal::Hex32(args.pConfigEnhance), sal::Hex32(hCodec->m_pIntermediateFrame),
-                         static_cast<int>(hCodec->m_uH264NALSize));
+            plan.pTemporaryConfig = static_cast<uint8_t *>(sal::Alloc(static_cast<uint32_t>(iSize)));
+            if (!plan.pTemporaryConfig)
+                return FailInit(hCodec, nullptr);
+            args.iConfigLen = ConvertConfig(plan.pTemporaryConfig, iSize);
+            args.pConfig = plan.pTemporaryConfig;
         }
     }
+    if (!ConvertEnhancement(hCodec, args, iWanted, kHevc))
+        return FailInit(hCodec, plan.pTemporaryConfig);
     return plan;
 }
 
@@ -267,23 +408,25 @@ inline bool Drop(uint32_t *puDecodeResult, int32_t *piResult) noexcept
 // not to be had.
 constexpr int32_t kNoRoom = -2;
 
-int32_t ConvertIntoIntermediate(CALCodec *hCodec, const VideoFrame &frame, int32_t iNALSize, int32_t iFormat) noexcept
+int32_t ConvertIntoIntermediate(CALCodec *hCodec, const VideoFrame &frame, int32_t iNALSize, int32_t iFormat,
+                                const NalCodecOps &ops) noexcept
 {
-    const int32_t iNewLen = tools::avc::ConvertFrame(hCodec->m_pIntermediateFrame, frame.iLen + kIntermediateHeadroom,
-                                                     frame.pData, frame.iLen, iNALSize, iFormat);
+    const int32_t iNewLen = ops.Convert(hCodec->m_pIntermediateFrame, frame.iLen + kIntermediateHeadroom, frame.pData,
+                                        frame.iLen, iNALSize, iFormat);
     if (iNewLen != -1)
         return iNewLen;
-    const int64_t iNeeded = tools::avc::ConvertedSize(frame.pData, frame.iLen, iNALSize, iFormat);
+    const int64_t iNeeded = ops.ConvertedSize(frame.pData, frame.iLen, iNALSize, iFormat);
     if (iNeeded <= int64_t{frame.iLen} + kIntermediateHeadroom || iNeeded > kMaxIntermediatePayload)
         return -1; // not a matter of room: the frame itself is broken
     if (!ReserveIntermediate(hCodec, static_cast<int32_t>(iNeeded)))
         return kNoRoom;
-    return tools::avc::ConvertFrame(hCodec->m_pIntermediateFrame, hCodec->m_iIntermediateFrameSize + kIntermediateHeadroom,
-                                    frame.pData, frame.iLen, iNALSize, iFormat);
+    return ops.Convert(hCodec->m_pIntermediateFrame, hCodec->m_iIntermediateFrameSize + kIntermediateHeadroom,
+                       frame.pData, frame.iLen, iNALSize, iFormat);
 }
 
-bool AdaptH264Frame(CALCodec *hCodec, VideoFrame &frame, CALParam uParam3, uint32_t *puDecodeResult,
-                    int32_t *piResult) noexcept
+// H.264 and HEVC frames: parameter-set removal (property 83) and framing conversion (81).
+bool AdaptNalFrame(CALCodec *hCodec, VideoFrame &frame, CALParam uParam3, uint32_t *puDecodeResult, int32_t *piResult,
+                   const NalCodecOps &ops) noexcept
 {
     const int32_t iNALSize = static_cast<int32_t>(hCodec->m_uH264NALSize);
     // The framing of the frame: from the configuration in the stream-aware mode, else from its
@@ -291,8 +434,8 @@ bool AdaptH264Frame(CALCodec *hCodec, VideoFrame &frame, CALParam uParam3, uint3
     // start code, so such a length-prefixed frame is searched, and later converted, as start-code
     // framed unless the configuration said otherwise.
     const int32_t iTrusted = TrustedFraming(hCodec);
-    auto FramingOf = [iTrusted](const VideoFrame &f) noexcept {
-        return iTrusted ? iTrusted : vorCALTools_AVC_CheckFormat(f.pData, f.iLen);
+    auto FramingOf = [iTrusted, &ops](const VideoFrame &f) noexcept {
+        return iTrusted ? iTrusted : ops.CheckFormat(f.pData, f.iLen);
     };
 
     // In-band parameter sets: cut the SEI/SPS/PPS run and everything in front of it.
@@ -300,8 +443,7 @@ bool AdaptH264Frame(CALCodec *hCodec, VideoFrame &frame, CALParam uParam3, uint3
     if (VideoPropertyAnswered(hCodec, CAL_PROP_H264_INBAND_PARAM_SETS, &uValue) && uValue == 0) {
         const bool bAnnexB = FramingOf(frame) == CAL_AVC_FORMAT_ANNEXB;
         int32_t iRunLen = 0;
-        const uint8_t *pRun = bAnnexB ? vorCALTools_AVC_ANNEXB_GetConfigStream(frame.pData, frame.iLen, &iRunLen)
-                                      : vorCALTools_AVC_NAL_GetConfigStream(frame.pData, frame.iLen, iNALSize, &iRunLen);
+        const uint8_t *pRun = ops.ConfigRun(frame.pData, frame.iLen, bAnnexB, iNALSize, &iRunLen);
         if (pRun) {
             const int32_t iNewLen = frame.iLen - iRunLen - static_cast<int32_t>(pRun - frame.pData);
             VORCAL_TRACE(kTraceH264Adapt, 4, "[CAL_Wrapper %d] %s bitstream has SPSPPS. => => Discard SPSPPS\n",
@@ -323,8 +465,11 @@ bool AdaptH264Frame(CALCodec *hCodec, VideoFrame &frame, CALParam uParam3, uint3
             return true;
         if (!ReserveIntermediate(hCodec, frame.iLen))
             return Drop(puDecodeResult, piResult);
-        const int32_t iNewLen = ConvertIntoIntermediate(hCodec, frame, iNALSize, iFormat);
-        if (iNewLen == -1)
+        const int32_t iNewLen = ConvertIntoIntermediate(hCodec, frame, iNALSize, iFormat, ops);
+        if (iNewLen == -1 && ops.bHevc)
+            VORCAL_TRACE(kTraceError, 0, "[CAL_Wrapper %d] vorCALTools_HEVC_ConvertFormat failed[%d],iLen[%d]\n",
+                         __LINE__, static_cast<int>(uParam3), frame.iLen);
+        else if (iNewLen == -1)
             VORCAL_TRACE(kTraceError, 0, "[CAL_Wrapper %d] vorCALTools_AVC_ConvertFormat failed[%d],iLen[%d]\n",
                          __LINE__, static_cast<int>(uParam3), frame.iLen);
         if (iNewLen < 0)
@@ -353,6 +498,8 @@ VideoInitPlan PrepareVideoInit(CALCodec *hCodec, VideoInitArgs &args) noexcept
     switch (args.uOTI) {
     case CAL_OTI_H264:
         return PrepareH264Init(hCodec, args);
+    case CAL_OTI_HEVC:
+        return PrepareHEVCInit(hCodec, args);
     case CAL_OTI_MPEG4_VISUAL:
     case CAL_OTI_H263:
         return PrepareMPEG4Init(hCodec, args);
@@ -369,7 +516,9 @@ bool AdaptVideoFrame(CALCodec *hCodec, VideoFrame &frame, CALParam uParam3, uint
         return true;
     switch (hCodec->m_uCodecObjectTypeIndication) {
     case CAL_OTI_H264:
-        return AdaptH264Frame(hCodec, frame, uParam3, puDecodeResult, piResult);
+        return AdaptNalFrame(hCodec, frame, uParam3, puDecodeResult, piResult, kAvc);
+    case CAL_OTI_HEVC:
+        return AdaptNalFrame(hCodec, frame, uParam3, puDecodeResult, piResult, kHevc);
     case CAL_OTI_MPEG4_VISUAL:
         AdaptMPEG4Frame(hCodec, frame);
         return true;

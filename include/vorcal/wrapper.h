@@ -21,15 +21,16 @@ extern "C" {
 typedef struct CALCodec {
     CALCodecFunc m_Functions[CAL_CODEC_FUNCTION_SLOTS]; /* copy of the registered table */
     CALParam m_uUserData;                 /* the codec's context, last argument of its slots */
-    uint32_t m_uAMRFrameType;             /* frame type of the first AMR frame; an H.264 instance in
-                                           * the stream-aware mode keeps here the frame framing taken
-                                           * from its configuration (CAL_AVC_FORMAT_*), else 0 */
+    uint32_t m_uAMRFrameType;             /* frame type of the first AMR frame; an H.264 or HEVC
+                                           * instance in the stream-aware mode keeps here the frame
+                                           * framing taken from its configuration (CAL_AVC_FORMAT_*),
+                                           * else 0 */
     uint32_t m_uCodecObjectTypeIndication;
     uint8_t *m_pSilenceFrame;             /* cached silence frame, owned by the instance */
     uint32_t m_uSilenceFrameLen;
-    uint8_t *m_pIntermediateFrame;        /* converted H.264 data; allocation is size + 100 */
+    uint8_t *m_pIntermediateFrame;        /* converted H.264 or HEVC data; allocation is size + 100 */
     int32_t m_iIntermediateFrameSize;     /* payload capacity of m_pIntermediateFrame */
-    uint32_t m_uH264NALSize;              /* NAL length size used for H.264 conversion */
+    uint32_t m_uH264NALSize;              /* NAL length size used for H.264 and HEVC conversion */
     CALHandle *m_hCAL;                    /* the handle whose dump slots are used */
 } CALCodec;
 
@@ -130,7 +131,14 @@ typedef struct CALVideoEncoderFunctions {
     CALCodecFunc pUnused5;
 } CALVideoEncoderFunctions;
 
-/* Property numbers the layer asks a codec for, with the answer that makes the layer act. */
+/* Property numbers the layer asks a codec for, with the answer that makes the layer act.
+ * For HEVC (CAL_OTI_HEVC) properties 3, 81, 82, 83 and CAL_PROP_TRUST_CONFIGURATION mean what
+ * they mean for H.264, with HEVC's tools: 3 writes the display size (conformance window applied)
+ * of vorCALTools_HEVC_ParseSPS from any configuration; 82 converts an hvcC record to its units
+ * behind start codes (2) or start-code parameter sets to an hvcC record with 4-byte lengths (1),
+ * and converts the enhancement configuration like a frame; 81 converts frames (length-prefixed
+ * output has 4-byte lengths); 83 = 0 removes the VPS/SPS/PPS/AUD/prefix SEI run in front of the
+ * first slice (vorCALTools_HEVC_GetConfigStream) and everything before it. 84 is not asked. */
 #define CAL_PROP_STREAM_PARAMETERS        3u   /* 1: the layer fills size or audio parameters */
 #define CAL_PROP_H264_FRAME_FORMAT        81u  /* 1 length-prefixed, 2 Annex B frames wanted */
 #define CAL_PROP_H264_CONFIG_FORMAT       82u  /* 1 or 2: framing wanted for the configuration */
@@ -142,16 +150,18 @@ typedef struct CALVideoEncoderFunctions {
 #define CAL_PROP_AMR_FRAME_TYPE_LOCK      113u /* 1: lock the AMR frame type of the first frame */
 #define CAL_PROP_AAC_SILENCE_FRAMES       114u /* 0: the codec takes no AAC silence frames */
 #define CAL_PROP_H263_NO_EXTENDED_PTYPE   160u /* 1: refuse H.263 with extended picture type */
-/* Asked at H.264 Init. 1 turns on the stream-aware mode: the frame framing and NAL length size
- * come from the Init configuration (an AVC decoder configuration record: length-prefixed frames
- * with its lengthSizeMinusOne + 1; start-code framing: start-code frames) instead of the format
- * test of each frame, for the parameter-set removal and the framing conversion alike; the picture
- * size of property 3 is the display size of vorCALTools_AVC_ParseSPS (also from a record).
- * A configuration shorter than 4 bytes leaves the framing to the format test. */
+/* Asked at H.264 and HEVC Init. 1 turns on the stream-aware mode: the frame framing and NAL
+ * length size come from the Init configuration (an AVC or HEVC decoder configuration record:
+ * length-prefixed frames with its lengthSizeMinusOne + 1; start-code framing: start-code frames)
+ * instead of the format test of each frame, for the parameter-set removal and the framing
+ * conversion alike; for H.264 the picture size of property 3 is the display size of
+ * vorCALTools_AVC_ParseSPS (also from a record). A configuration shorter than 4 bytes leaves the
+ * framing to the format test. */
 #define CAL_PROP_TRUST_CONFIGURATION      0x1000u
 
 /* Codec object type indications the library branches on. */
 #define CAL_OTI_MPEG4_VISUAL   0x20u
+#define CAL_OTI_HEVC           0x23u /* ITU-T H.265, ISO/IEC 14496-1; video decoder Init and Decode */
 #define CAL_OTI_AAC            0x40u
 #define CAL_OTI_AAC_SBR        0x41u
 #define CAL_OTI_MPEG2_AAC      0x67u
@@ -180,7 +190,7 @@ typedef struct CALVideoEncoderFunctions {
 /* Video decoder: slot 0. */
 VORCAL_API int32_t vorCAL_VideoDecoderGetProperty(CALCodec *hCodec, uint32_t uProperty,
                                                   uint32_t *puValue);
-/* Video decoder: slot 1 after the H.264, MPEG-4 Visual and H.263 adaptations; 17 = refused. */
+/* Video decoder: slot 1 after the H.264, HEVC, MPEG-4 Visual and H.263 adaptations; 17 = refused. */
 VORCAL_API int32_t vorCAL_VideoDecoderInit(CALCodec *hCodec, uint32_t uCodecObjectTypeIndication,
                                            const uint8_t *pConfig, int32_t iConfigLen,
                                            const uint8_t *pConfigEnhance, int32_t iEnhLen,
@@ -196,7 +206,7 @@ VORCAL_API int32_t vorCAL_VideoDecoderGetOutput(CALCodec *hCodec, CALParam uPara
                                                 CALParam uParam3, CALParam uParam4);
 /* Video decoder: slot 5. */
 VORCAL_API int32_t vorCAL_VideoDecoderReset(CALCodec *hCodec);
-/* Video decoder: frees the intermediate H.264 buffer, then slot 2. */
+/* Video decoder: frees the intermediate H.264/HEVC buffer, then slot 2. */
 VORCAL_API int32_t vorCAL_VideoDecoderDeinit(CALCodec *hCodec);
 
 /* Audio decoder: slot 0. */

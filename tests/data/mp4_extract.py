@@ -1,9 +1,10 @@
 #!/usr/bin/env python3
-"""Pulls the H.264 track of a small MP4 apart for the test fixtures.
+"""Pulls the H.264 or HEVC track of a small MP4 apart for the test fixtures.
 
 usage: mp4_extract.py IN.mp4 OUT_PREFIX
-writes OUT_PREFIX.avcc (the AVCDecoderConfigurationRecord, ISO/IEC 14496-15 5.2.4.1, without
-its box header) and OUT_PREFIX.nal (every sample of the first video track in decode order,
+writes OUT_PREFIX.avcc (the AVCDecoderConfigurationRecord, ISO/IEC 14496-15 5.2.4.1) or, for an
+hvc1/hev1 track, OUT_PREFIX.hvcc (the HEVCDecoderConfigurationRecord, 8.3.3.1), each without its
+box header, and OUT_PREFIX.nal (every sample of the first video track in decode order,
 concatenated as stored: NAL units behind big-endian length fields), and prints one line
 "sample <offset in .nal> <size>" per sample.
 """
@@ -58,14 +59,18 @@ def main():
         if stbl is None:
             continue
         stsd = child(data, *stbl, [b"stsd"])
-        # stsd: version/flags, entry count, then the sample entry; avc1 has 78 bytes before
-        # its child boxes.
+        # stsd: version/flags, entry count, then the sample entry; avc1 and hvc1 have 78 bytes
+        # before their child boxes.
         entry_start = stsd[0] + 8
         esize, ekind = struct.unpack(">I4s", data[entry_start:entry_start + 8])
-        if ekind not in (b"avc1", b"avc3"):
+        if ekind in (b"avc1", b"avc3"):
+            box, suffix = b"avcC", ".avcc"
+        elif ekind in (b"hvc1", b"hev1"):
+            box, suffix = b"hvcC", ".hvcc"
+        else:
             continue
-        avcc = child(data, entry_start + 8 + 78, entry_start + esize, [b"avcC"])
-        open(prefix + ".avcc", "wb").write(data[avcc[0]:avcc[1]])
+        record = child(data, entry_start + 8 + 78, entry_start + esize, [box])
+        open(prefix + suffix, "wb").write(data[record[0]:record[1]])
 
         s, _ = child(data, *stbl, [b"stsz"])
         fixed, count = struct.unpack(">II", data[s + 4:s + 12])
@@ -101,7 +106,7 @@ def main():
                 sample += 1
         open(prefix + ".nal", "wb").write(out)
         return 0
-    sys.exit("no H.264 track in " + src)
+    sys.exit("no H.264 or HEVC track in " + src)
 
 
 if __name__ == "__main__":

@@ -41,6 +41,7 @@ run:
 	$(VORCAL) frames $(SAMPLES)/h264_misread.mp4
 	$(VORCAL) convert $(SAMPLES)/h264_high.mp4 $(RUN)/h264_high.h264 --to annexb
 	$(VORCAL) frames $(RUN)/h264_high.h264
+	$(VORCAL) probe tests/data/hevc/decode_128x96.mp4 && $(VORCAL) frames tests/data/hevc/main_176x144.hevc
 	$(VORCAL) silence --codec aac -o $(RUN)/silence.aac
 	$(VORCAL) silence --codec amrnb -o $(RUN)/silence.amr
 	$(VORCAL) probe $(RUN)/silence.aac $(RUN)/silence.amr

@@ -28,43 +28,47 @@ constexpr Verb kVerbs[] = {
     {"probe", "what the layer's tools find in each stream",
      "usage: vorcal probe [--json] [--wait S] FILE...\n"
      "Per stream: codec, framing and NAL length size, profile and level, picture size (and what\n"
-     "vorCALTools_AVC_GetSPSInfo reports beside it), SAR, bit depth, chroma format; for AAC the\n"
-     "object type, core and output rate and channels, SBR and PS and how each is signalled; the\n"
-     "AMR frame types; the frame count. Keys follow ffprobe's names where the fact is the same.\n"
+     "vorCALTools_AVC_GetSPSInfo reports beside it; HEVC's from vorCALTools_HEVC_ParseSPS), SAR,\n"
+     "bit depth, chroma format; for AAC the object type, core and output rate and channels, SBR\n"
+     "and PS and how each is signalled; the AMR frame types; the frame count. Keys follow\n"
+     "ffprobe's names where the fact is the same.\n"
      "  --json     one object {\"streams\": [...]}\n"
      "  --wait S   seconds a FIFO may wait for its writer (default 10)\n",
      ProbeVerb},
     {"frames", "one line per frame with the layer's classification",
      "usage: vorcal frames [--json] [--stream N] [--wait S] FILE\n"
-     "Per frame: index, offset, size, picture type, NAL unit types (H.264), what\n"
-     "vorCALTools_IsIDRFrame (key) and vorCALTools_IsBFrame (B) answer, and for H.264 the answer of\n"
-     "vorCALTools_AVC_CheckFormat and whether it names the frame's real framing.\n"
+     "Per frame: index, offset, size, picture type, NAL unit types (H.264; HEVC by their Table 7-1\n"
+     "names), what vorCALTools_IsIDRFrame (key) and vorCALTools_IsBFrame (B) answer (HEVC: key is\n"
+     "vorCALTools_HEVC_IsIRAP), and for H.264 and HEVC the answer of the format test\n"
+     "(vorCALTools_AVC_CheckFormat, vorCALTools_HEVC_CheckFormat) and whether it names the frame's\n"
+     "real framing.\n"
      "  --json       {\"frames\": [...]}\n"
      "  --stream N   the stream to list (default: the first video stream)\n",
      FramesVerb},
-    {"convert", "H.264 through the video decoder wrapper, written as a codec receives it",
+    {"convert", "H.264 or HEVC through the video decoder wrapper, written as a codec receives it",
      "usage: vorcal convert [--json] IN OUT --to annexb|length [--nal-length N] [--strip-ps]\n"
      "                      [--trust-config] [--stream N]\n"
      "Runs IN's configuration and frames through vorCAL_VideoDecoderInit and\n"
      "vorCAL_VideoDecoderDecode with a codec that asks for the chosen framing, and writes what it\n"
      "receives: an Annex B stream with the configuration in front (annexb), or a frame dump of\n"
      "length-prefixed frames with the configuration as first record (length). OUT may be -.\n"
-     "  --nal-length N   NAL length size of IN's frames (default: from the avcC record, else 4)\n"
+     "  --nal-length N   NAL length size of IN's frames (default: from the avcC or hvcC record,\n"
+     "                   else 4)\n"
      "  --strip-ps       the codec asks for parameter sets inside frames to be removed\n"
      "  --trust-config   the codec asks for the stream-aware adaptation (property 0x1000)\n"
      "Frames the layer drops are reported on standard error with their index (exit 1).\n",
      ConvertVerb},
     {"replay", "a dump (or any input) through the layer, frame by frame",
-     "usage: vorcal replay [--json] INPUT [--codec h264|mpeg4|h263|aac|amrnb|amrwb]\n"
+     "usage: vorcal replay [--json] INPUT [--codec h264|hevc|mpeg4|h263|aac|amrnb|amrwb]\n"
      "                     [--wants annexb|length] [--strip-ps] [--lock-amr] [-o OUT] [options]\n"
      "Feeds the configuration (a dump's first record) and the frames to a recording codec\n"
      "through the layer and shows what the codec receives: passed, converted, stripped, moved to\n"
      "the VOP, dropped, or substituted by a silent frame.\n"
      "  --codec C            the codec (needed when a dump does not tell)\n"
-     "  --wants F            H.264 framing the codec asks for (properties 81 and 82)\n"
-     "  --nal-length N       NAL length size passed to Init (default: avcC, else 4)\n"
+     "  --wants F            H.264/HEVC framing the codec asks for (properties 81 and 82)\n"
+     "  --nal-length N       NAL length size passed to Init (default: avcC or hvcC, else 4)\n"
      "  --strip-ps           property 83 = 0: remove parameter sets inside frames\n"
-     "  --trust-config       property 0x1000 = 1: stream-aware H.264 adaptation\n"
+     "  --trust-config       property 0x1000 = 1: stream-aware H.264/HEVC adaptation\n"
      "  --no-main            property 84 = 1: refuse H.264 Main profile\n"
      "  --vop-start          property 97 = 1: MPEG-4 frames start at their VOP\n"
      "  --no-level3          property 101 = 1: refuse MPEG-4 Visual level 3\n"
@@ -103,9 +107,10 @@ constexpr Verb kVerbs[] = {
     {"sps", "the full SPS parse and the documented SPS tool side by side",
      "usage: vorcal sps [--json] [--stream N] [--wait S] FILE|HEX\n"
      "Parses the first sequence parameter set with vorCALTools_AVC_ParseSPS and shows every field\n"
-     "beside what vorCALTools_AVC_GetSPSInfo reports for it. FILE is any input the tool reads (the\n"
-     "SPS of the configuration, else of the first frame that carries one), or a file holding an SPS\n"
-     "NAL unit, start-code framed bytes or an avcC record; HEX is such bytes as hex digits (spaces\n"
+     "beside what vorCALTools_AVC_GetSPSInfo reports for it; an HEVC SPS with\n"
+     "vorCALTools_HEVC_ParseSPS alone. FILE is any input the tool reads (the SPS of the\n"
+     "configuration, else of the first frame that carries one), or a file holding an SPS NAL unit,\n"
+     "start-code framed bytes or an avcC or hvcC record; HEX is such bytes as hex digits (spaces\n"
      "and colons allowed), for example\n"
      "  vorcal sps 67:42:c0:0c:d9:02:c4:ec:04:40:00:00:03:00:40:00:00:0c:83:c5:0a:92\n"
      "  --json       one object: ffprobe's names for the picture facts, \"sps\" and \"sps_tool\"\n"

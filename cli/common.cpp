@@ -72,6 +72,7 @@ const char *FormatName(Format format)
     switch (format) {
     case Format::Mp4: return "ISO BMFF (MP4/MOV/3GP/M4A)";
     case Format::AnnexB: return "H.264 Annex B elementary stream";
+    case Format::HevcAnnexB: return "HEVC Annex B elementary stream";
     case Format::Adts: return "ADTS AAC";
     case Format::Amr: return "AMR storage file";
     case Format::AmrWb: return "AMR-WB storage file";

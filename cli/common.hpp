@@ -56,9 +56,9 @@ enum class MediaKind : uint8_t { Unknown, Video, Audio };
 enum class Codec : uint8_t { Unknown, H264, Hevc, Mpeg4Visual, H263, Mpeg1Video, Mpeg2Video, Aac, AmrNb, AmrWb };
 
 // The input's layout, detected from its first bytes.
-enum class Format : uint8_t { Mp4, AnnexB, Adts, Amr, AmrWb, Mpeg4Visual, H263, Mpeg12Video, Dump };
+enum class Format : uint8_t { Mp4, AnnexB, HevcAnnexB, Adts, Amr, AmrWb, Mpeg4Visual, H263, Mpeg12Video, Dump };
 
-// How H.264 NAL units are delimited in the frames of a stream.
+// How H.264 and HEVC NAL units are delimited in the frames of a stream.
 enum class Framing : uint8_t { None, AnnexB, LengthPrefixed };
 
 // ffprobe's codec_name.

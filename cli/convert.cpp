@@ -65,7 +65,7 @@ bool ParseOptions(Console &console, const char *pVerb, int argc, char **argv, Se
     static constexpr struct {
         const char *pName;
         Codec codec;
-    } kCodecs[] = {{"h264", Codec::H264}, {"mpeg4", Codec::Mpeg4Visual}, {"h263", Codec::H263},
+    } kCodecs[] = {{"h264", Codec::H264}, {"hevc", Codec::Hevc}, {"mpeg4", Codec::Mpeg4Visual}, {"h263", Codec::H263},
                    {"aac", Codec::Aac},   {"amrnb", Codec::AmrNb},        {"amrwb", Codec::AmrWb}};
     uint64_t uNumber = 0;
     for (int c; (c = getopt_long(argc, argv, bConvert ? "" : "o:", kOptions, nullptr)) != -1;) {
@@ -151,15 +151,15 @@ int ConvertVerb(Console &console, int argc, char **argv)
         return kExitData;
     const int iChosen = ChooseStream(*file, settings.iStream, MediaKind::Video);
     const StreamInfo *pInfo = iChosen >= 0 ? &file->Streams()[static_cast<size_t>(iChosen)] : nullptr;
-    if (!pInfo || pInfo->codec != Codec::H264) {
-        Report(console, in, Sprintf("convert takes H.264; stream %d is %s", iChosen,
+    if (!pInfo || (pInfo->codec != Codec::H264 && pInfo->codec != Codec::Hevc)) {
+        Report(console, in, Sprintf("convert takes H.264 or HEVC; stream %d is %s", iChosen,
                                    pInfo ? CodecName(pInfo->codec) : "missing"));
         return kExitData;
     }
     const uint32_t uNalLength = settings.iNalLength     ? static_cast<uint32_t>(settings.iNalLength)
                                 : pInfo->uNalLengthSize ? pInfo->uNalLengthSize
                                                         : 4;
-    LayerSession session(MediaKind::Video, CAL_OTI_H264, settings.answers);
+    LayerSession session(MediaKind::Video, OtiOf(pInfo->codec), settings.answers);
     if (!session.Ok()) {
         Report(console, in, "the layer gave no codec instance");
         return kExitData;
@@ -318,15 +318,15 @@ int ReplayVerb(Console &console, int argc, char **argv)
         uChanged += std::string(pHow) != "passed";
         uDropped += !last.bCalled;
         std::string detail;
-        if (codec == Codec::H264 && last.bCalled) {
+        if ((codec == Codec::H264 || codec == Codec::Hevc) && last.bCalled) {
             // The units the codec got; fewer than the frame had means parameter sets were cut too.
             std::vector<uint32_t> types, typesIn;
-            const Framing framing = vorCALTools_AVC_CheckFormat(last.bytes.data(), static_cast<int32_t>(last.bytes.size())) ==
-                                            CAL_AVC_FORMAT_ANNEXB
-                                        ? Framing::AnnexB
-                                        : Framing::LengthPrefixed;
-            NalUnitTypes(last.bytes.data(), last.bytes.size(), framing, 4, types);
-            NalUnitTypes(packet.data.data(), packet.data.size(), info.framing, info.uNalLengthSize, typesIn);
+            const int32_t iGot = static_cast<int32_t>(last.bytes.size());
+            const int32_t iFormat = codec == Codec::Hevc ? vorCALTools_HEVC_CheckFormat(last.bytes.data(), iGot)
+                                                         : vorCALTools_AVC_CheckFormat(last.bytes.data(), iGot);
+            const Framing framing = iFormat == CAL_AVC_FORMAT_ANNEXB ? Framing::AnnexB : Framing::LengthPrefixed;
+            NalUnitTypes(codec, last.bytes.data(), last.bytes.size(), framing, 4, types);
+            NalUnitTypes(codec, packet.data.data(), packet.data.size(), info.framing, info.uNalLengthSize, typesIn);
             if (std::string(pHow) == "converted" && types.size() < typesIn.size())
                 pHow = "stripped+converted";
             for (uint32_t uType : types)

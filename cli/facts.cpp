@@ -152,6 +152,7 @@ uint32_t OtiOf(Codec codec)
 {
     switch (codec) {
     case Codec::H264: return CAL_OTI_H264;
+    case Codec::Hevc: return CAL_OTI_HEVC;
     case Codec::Mpeg4Visual: return CAL_OTI_MPEG4_VISUAL;
     case Codec::H263: return CAL_OTI_H263;
     case Codec::Mpeg1Video:
@@ -212,17 +213,28 @@ AvcFacts ExamineAvc(const StreamInfo &info)
     return facts;
 }
 
-std::string PixFmtName(const FullSps &sps)
+namespace {
+
+// The pixel format of a picture; bJpegAll: full-range 8-bit YUV of every chroma format has a
+// "yuvj" name, else only 4:2:0 has.
+std::string PixFmtOf(uint32_t uChromaFormatIdc, uint32_t uBitDepth, bool bFullRange, uint32_t uMatrix, bool bJpegAll)
 {
     // 4:4:4 with matrix_coefficients 0 is coded as G, B, R planes (ISO/IEC 23091-2 8.3).
     static constexpr std::array<const char *, 4> kChroma = {"gray", "yuv420p", "yuv422p", "yuv444p"};
-    const uint32_t uChroma = sps.uChromaFormatIdc & 3;
-    const bool bGbr = uChroma == 3 && sps.uMatrixCoefficients == 0;
+    const uint32_t uChroma = uChromaFormatIdc & 3;
+    const bool bGbr = uChroma == 3 && uMatrix == 0;
     const std::string base = bGbr ? "gbrp" : kChroma[uChroma];
-    if (sps.uBitDepthLuma != 8)
-        return Sprintf("%s%ule", base.c_str(), sps.uBitDepthLuma);
-    // Full-range 8-bit YUV has names of its own.
-    return sps.uVideoFullRange && uChroma != 0 && !bGbr ? "yuvj" + base.substr(3) : base;
+    if (uBitDepth != 8)
+        return Sprintf("%s%ule", base.c_str(), uBitDepth);
+    const bool bJpeg = bFullRange && !bGbr && (bJpegAll ? uChroma != 0 : uChroma == 1);
+    return bJpeg ? "yuvj" + base.substr(3) : base;
+}
+
+} // namespace
+
+std::string PixFmtName(const FullSps &sps)
+{
+    return PixFmtOf(sps.uChromaFormatIdc, sps.uBitDepthLuma, sps.uVideoFullRange != 0, sps.uMatrixCoefficients, true);
 }
 
 std::string ColorRangeName(const FullSps &sps)
@@ -345,12 +357,92 @@ bool ForEachNal(const uint8_t *p, size_t uSize, Framing framing, uint32_t uNalLe
     return true;
 }
 
-bool NalUnitTypes(const uint8_t *p, size_t uSize, Framing framing, uint32_t uNalLengthSize,
+bool NalUnitTypes(Codec codec, const uint8_t *p, size_t uSize, Framing framing, uint32_t uNalLengthSize,
                   std::vector<uint32_t> &types)
 {
     types.clear();
-    return ForEachNal(p, uSize, framing, uNalLengthSize,
-                      [&](const uint8_t *pUnit, size_t) { types.push_back(pUnit[0] & 0x1Fu); });
+    return ForEachNal(p, uSize, framing, uNalLengthSize, [&](const uint8_t *pUnit, size_t) {
+        types.push_back(codec == Codec::Hevc ? (pUnit[0] >> 1) & 0x3Fu : pUnit[0] & 0x1Fu);
+    });
+}
+
+// ---- HEVC --------------------------------------------------------------------------------
+
+bool IsHevcSps(const uint8_t *pUnit, size_t uSize)
+{
+    return uSize >= 2 && (pUnit[0] & 0x81) == 0 && (pUnit[0] >> 1) == CAL_HEVC_NAL_SPS && pUnit[1] >= 1 &&
+           pUnit[1] <= 7;
+}
+
+std::vector<uint8_t> FindHevcSps(const std::vector<uint8_t> &data)
+{
+    if (data.size() > INT32_MAX)
+        return {};
+    const int32_t iLen = static_cast<int32_t>(data.size());
+    CALHEVCConfig record;
+    const bool bRecord = vorCALTools_HEVC_ParseHvcC(data.data(), iLen, &record) == CAL_HEVC_OK &&
+                         record.uConfigurationVersion == 1;
+    if (!bRecord && IsHevcSps(data.data(), data.size()))
+        return data;
+    // A walk that breaks still gives the units before the break.
+    CALHEVCNAL u{};
+    while ((bRecord ? vorCALTools_HEVC_NextHvcCNAL(data.data(), iLen, &u)
+                    : vorCALTools_HEVC_NextNAL(data.data(), iLen, 0, &u)) == 1)
+        if (IsHevcSps(u.pUnit, static_cast<size_t>(u.iLen)))
+            return {u.pUnit, u.pUnit + u.iLen};
+    return {};
+}
+
+void ExamineHevcSps(const std::vector<uint8_t> &nal, HevcFacts &facts)
+{
+    facts.sps = nal;
+    if (nal.empty() || nal.size() > INT32_MAX)
+        return;
+    facts.iResult = vorCALTools_HEVC_ParseSPS(nal.data(), static_cast<int32_t>(nal.size()), &facts.full);
+    facts.bOk = facts.iResult == CAL_HEVC_OK;
+}
+
+HevcFacts ExamineHevc(const StreamInfo &info)
+{
+    HevcFacts facts;
+    ExamineHevcSps(FindHevcSps(info.config), facts);
+    return facts;
+}
+
+std::string HevcProfileName(const CALHEVCSPS &sps)
+{
+    uint32_t uProfile = sps.uProfileIdc;
+    for (uint32_t j = 0; uProfile == 0 && j < 32; ++j)
+        if (sps.uProfileCompatibilityFlags & (0x80000000u >> j)) {
+            uProfile = j;
+            break;
+        }
+    static constexpr std::array<const char *, 5> kNames = {nullptr, "Main", "Main 10", "Main Still Picture", "Rext"};
+    return uProfile < kNames.size() && kNames[uProfile] ? kNames[uProfile] : std::string();
+}
+
+std::string PixFmtName(const CALHEVCSPS &sps)
+{
+    return PixFmtOf(sps.uChromaFormatIdc, sps.uBitDepthLuma, sps.uVideoFullRange != 0, sps.uMatrixCoefficients, false);
+}
+
+std::string ColorRangeName(const CALHEVCSPS &sps)
+{
+    return sps.uVideoFullRange ? "pc" : "tv";
+}
+
+const char *HevcResultName(int32_t iResult)
+{
+    switch (iResult) {
+    case CAL_HEVC_OK: return "ok";
+    case CAL_HEVC_ERR_ARGUMENT: return "bad argument";
+    case CAL_HEVC_ERR_NOT_FOUND: return "no SPS";
+    case CAL_HEVC_ERR_MALFORMED: return "malformed";
+    case CAL_HEVC_ERR_TRUNCATED: return "truncated";
+    case CAL_HEVC_ERR_NO_ROOM: return "no room";
+    case CAL_HEVC_ERR_TOO_LONG: return "too long";
+    default: return "unknown result";
+    }
 }
 
 // ---- AAC ---------------------------------------------------------------------------------
@@ -517,8 +609,80 @@ VisualFacts ExamineVisual(const StreamInfo &info, const std::vector<uint8_t> &fi
 
 // ---- Frames -------------------------------------------------------------------------------
 
+namespace {
+
+// Visits the units of HEVC data (iSize -1: an hvcC record, 0: start codes, 1-4: length fields);
+// returns how the walk ended (0 at the end, a CAL_HEVC_ERR_* result where the data breaks).
+int32_t ForEachHevcUnit(const std::vector<uint8_t> &data, int32_t iSize,
+                        const std::function<void(const CALHEVCNAL &)> &visit)
+{
+    if (data.size() > INT32_MAX)
+        return CAL_HEVC_ERR_TOO_LONG;
+    const int32_t iLen = static_cast<int32_t>(data.size());
+    CALHEVCNAL u{};
+    int32_t r;
+    while ((r = iSize < 0 ? vorCALTools_HEVC_NextHvcCNAL(data.data(), iLen, &u)
+                          : vorCALTools_HEVC_NextNAL(data.data(), iLen, iSize, &u)) == 1)
+        visit(u);
+    return r;
+}
+
+// num_extra_slice_header_bits of a PPS (ITU-T H.265 7.3.2.3.1), by pps_pic_parameter_set_id.
+using ExtraSliceBits = std::array<uint8_t, 64>;
+void ReadPpsExtraBits(const CALHEVCNAL &u, ExtraSliceBits &extra)
+{
+    BitReader bits(u.pUnit + 2, static_cast<size_t>(u.iLen) - 2);
+    const uint32_t uId = bits.UE();
+    bits.UE();    // pps_seq_parameter_set_id
+    bits.Bits(2); // dependent_slice_segments_enabled_flag, output_flag_present_flag
+    if (uId < extra.size())
+        extra[uId] = static_cast<uint8_t>(bits.Bits(3));
+}
+
+// IRAP test, NAL unit walk and the slice_type of the picture's first slice segment (7.3.6.1).
+FrameFacts ClassifyHevcFrame(const StreamInfo &info, const Packet &packet)
+{
+    FrameFacts facts;
+    const int32_t iLen = static_cast<int32_t>(packet.data.size());
+    const int32_t iSize = info.framing == Framing::LengthPrefixed ? static_cast<int32_t>(info.uNalLengthSize) : 0;
+    facts.iIntra = vorCALTools_HEVC_IsIRAP(packet.data.data(), iLen, iSize);
+    facts.iFormat = vorCALTools_HEVC_CheckFormat(packet.data.data(), iLen);
+    facts.bFormatAgrees = facts.iFormat == (iSize ? CAL_AVC_FORMAT_NAL : CAL_AVC_FORMAT_ANNEXB);
+    ExtraSliceBits extra{};
+    const int32_t iConfigLen = static_cast<int32_t>(info.config.size());
+    const bool bRecord = vorCALTools_HEVC_CheckFormat(info.config.data(), iConfigLen) != CAL_AVC_FORMAT_ANNEXB;
+    ForEachHevcUnit(info.config, bRecord ? -1 : 0, [&](const CALHEVCNAL &u) {
+        if (u.uType == CAL_HEVC_NAL_PPS)
+            ReadPpsExtraBits(u, extra);
+    });
+    const int32_t r = ForEachHevcUnit(packet.data, iSize, [&](const CALHEVCNAL &u) {
+        facts.nalTypes.push_back(u.uType);
+        if (u.uType == CAL_HEVC_NAL_PPS)
+            ReadPpsExtraBits(u, extra);
+        constexpr uint32_t kLastVcl = 31;
+        if (facts.pictType != "?" || u.uType > kLastVcl || u.uLayerId != 0)
+            return;
+        BitReader bits(u.pUnit + 2, static_cast<size_t>(u.iLen) - 2);
+        if (!bits.Bit()) // first_slice_segment_in_pic_flag
+            return;
+        if (u.uType >= CAL_HEVC_NAL_BLA_W_LP && u.uType <= CAL_HEVC_NAL_RSV_IRAP_VCL23)
+            bits.Bit(); // no_output_of_prior_pics_flag
+        const uint32_t uPps = bits.UE();
+        bits.Bits(uPps < extra.size() ? extra[uPps] : 0); // slice_reserved_flag[i]
+        const uint32_t uType = bits.UE();
+        facts.pictType = uType < 3 ? std::array{"B", "P", "I"}[uType] : "?";
+    });
+    facts.iValid = r == 0;
+    facts.iB = facts.pictType == "B";
+    return facts;
+}
+
+} // namespace
+
 FrameFacts ClassifyFrame(const StreamInfo &info, const Packet &packet)
 {
+    if (info.codec == Codec::Hevc)
+        return ClassifyHevcFrame(info, packet);
     FrameFacts facts;
     const uint8_t *p = packet.data.data();
     const size_t n = packet.data.size();

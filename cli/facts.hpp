@@ -1,5 +1,5 @@
 // What the layer's tools (and a few header reads of the tool's own) find in a stream's
-// configuration and frames: H.264 parameter sets, AAC signalling, MPEG-4 Visual, H.263 and
+// configuration and frames: H.264 and HEVC parameter sets, AAC signalling, MPEG-4 Visual, H.263 and
 // MPEG-1/2 headers, and the per-frame classification.
 #pragma once
 
@@ -55,6 +55,33 @@ const char *ColorSpaceName(uint32_t uCode);
 // Names of the CAL_AVC_SPS_* results and of the documented tool's results.
 const char *FullSpsResultName(int32_t iResult);
 const char *SpsToolResultName(uint32_t uResult);
+
+// ---- HEVC --------------------------------------------------------------------------------
+
+struct HevcFacts {
+    std::vector<uint8_t> sps; // the first base-layer SPS NAL unit, header first; empty when none
+    int32_t iResult = CAL_HEVC_ERR_NOT_FOUND; // vorCALTools_HEVC_ParseSPS
+    bool bOk = false;
+    CALHEVCSPS full{};
+};
+
+HevcFacts ExamineHevc(const StreamInfo &info);
+// vorCALTools_HEVC_ParseSPS of one SPS NAL unit (header first) into facts.
+void ExamineHevcSps(const std::vector<uint8_t> &nal, HevcFacts &facts);
+// A base-layer SPS NAL unit header (nal_unit_type 33, nuh_layer_id 0, nuh_temporal_id_plus1 set).
+bool IsHevcSps(const uint8_t *pUnit, size_t uSize);
+// The first base-layer SPS NAL unit of an hvcC record, of start-code framed data, or the data
+// itself when it is one SPS NAL unit; empty when none.
+std::vector<uint8_t> FindHevcSps(const std::vector<uint8_t> &data);
+// ffprobe's name of an HEVC profile ("Main", "Main 10", "Main Still Picture", "Rext"): of
+// general_profile_idc, or when that is 0 of the first compatibility flag set; empty for others.
+std::string HevcProfileName(const CALHEVCSPS &sps);
+// ffprobe's pixel format and colour range of an HEVC SPS (full range makes only 8-bit 4:2:0 a
+// "yuvj" format; the range is "tv" unless video_full_range_flag says "pc").
+std::string PixFmtName(const CALHEVCSPS &sps);
+std::string ColorRangeName(const CALHEVCSPS &sps);
+// Name of a CAL_HEVC_* result.
+const char *HevcResultName(int32_t iResult);
 
 // ---- AAC ---------------------------------------------------------------------------------
 
@@ -122,11 +149,11 @@ VisualFacts ExamineVisual(const StreamInfo &info, const std::vector<uint8_t> &fi
 
 struct FrameFacts {
     std::string pictType = "?";    // I, P, B, S (MPEG-4 sprite), or ? when not told
-    std::vector<uint32_t> nalTypes; // H.264 NAL unit types in order
-    int iIntra = 0;                 // vorCALTools_IsIDRFrame
-    int iB = 0;                     // vorCALTools_IsBFrame
-    int iValid = 1;                 // vorCALTools_IsValidVideo
-    int iFormat = -1;               // vorCALTools_AVC_CheckFormat (H.264 only)
+    std::vector<uint32_t> nalTypes; // H.264 or HEVC NAL unit types in order
+    int iIntra = 0;                 // vorCALTools_IsIDRFrame (HEVC: vorCALTools_HEVC_IsIRAP)
+    int iB = 0;                     // vorCALTools_IsBFrame (HEVC: a B slice first)
+    int iValid = 1;                 // vorCALTools_IsValidVideo (HEVC: the unit walk reaches the end)
+    int iFormat = -1;               // vorCALTools_AVC_CheckFormat or vorCALTools_HEVC_CheckFormat
     bool bFormatAgrees = true;      // the format test names the stream's real framing
     int iAmrFrameType = -1;
 };
@@ -137,9 +164,9 @@ FrameFacts ClassifyFrame(const StreamInfo &info, const Packet &packet);
 // framing does not hold to the end of the frame.
 bool ForEachNal(const uint8_t *p, size_t uSize, Framing framing, uint32_t uNalLengthSize,
                 const std::function<void(const uint8_t *, size_t)> &visit);
-// The NAL unit types of an H.264 frame, walked in its real framing; false when the framing
-// does not hold to the end of the frame.
-bool NalUnitTypes(const uint8_t *p, size_t uSize, Framing framing, uint32_t uNalLengthSize,
+// The NAL unit types of an H.264 or HEVC frame, walked in its real framing; false when the
+// framing does not hold to the end of the frame.
+bool NalUnitTypes(Codec codec, const uint8_t *p, size_t uSize, Framing framing, uint32_t uNalLengthSize,
                   std::vector<uint32_t> &types);
 
 } // namespace vorcal::cli

@@ -10,11 +10,13 @@ namespace {
 
 enum FramesOption { kOptJson = 1000, kOptStream, kOptWait };
 
-std::string JoinTypes(const std::vector<uint32_t> &types)
+// H.264 NAL unit types as numbers, HEVC ones by their Table 7-1 names.
+std::string JoinTypes(Codec codec, const std::vector<uint32_t> &types)
 {
     std::string text;
     for (uint32_t uType : types)
-        text += (text.empty() ? "" : ",") + std::to_string(uType);
+        text += (text.empty() ? "" : ",") +
+                (codec == Codec::Hevc ? std::string(vorCALTools_HEVC_NALTypeName(uType)) : std::to_string(uType));
     return text.empty() ? "-" : text;
 }
 
@@ -51,7 +53,8 @@ int FramesVerb(Console &console, int argc, char **argv)
         return kExitData;
     }
     const StreamInfo &info = file->Streams()[static_cast<size_t>(iChosen)];
-    const bool bH264 = info.codec == Codec::H264;
+    // H.264 and HEVC: the NAL unit walk and the format test.
+    const bool bH264 = info.codec == Codec::H264 || info.codec == Codec::Hevc;
     const bool bAudio = KindOf(info.codec) == MediaKind::Audio;
     std::unique_ptr<PacketReader> reader = file->Packets(static_cast<size_t>(iChosen));
 
@@ -92,6 +95,12 @@ int FramesVerb(Console &console, int argc, char **argv)
                 for (uint32_t uType : facts.nalTypes)
                     types.Push(uType);
                 frame.Add("nal_unit_types", std::move(types));
+                if (info.codec == Codec::Hevc) {
+                    Value names = Value::Array();
+                    for (uint32_t uType : facts.nalTypes)
+                        names.Push(vorCALTools_HEVC_NALTypeName(uType));
+                    frame.Add("nal_unit_names", std::move(names));
+                }
                 frame.Add("format_test", pFormat).Add("format_agrees", facts.bFormatAgrees);
             }
             if (facts.iAmrFrameType >= 0)
@@ -102,7 +111,7 @@ int FramesVerb(Console &console, int argc, char **argv)
                          static_cast<unsigned long long>(uIndex), static_cast<unsigned long long>(packet.uOffset),
                          packet.data.size(), facts.iIntra, facts.pictType.c_str(), facts.iB, pSync,
                          facts.bFormatAgrees ? pFormat : Sprintf("%s (wrong)", pFormat).c_str(),
-                         JoinTypes(facts.nalTypes).c_str());
+                         JoinTypes(info.codec, facts.nalTypes).c_str());
         } else if (bAudio) {
             std::fprintf(console.pOut, "%-7llu %-12llu %-8zu %s\n", static_cast<unsigned long long>(uIndex),
                          static_cast<unsigned long long>(packet.uOffset), packet.data.size(),
@@ -120,8 +129,8 @@ int FramesVerb(Console &console, int argc, char **argv)
         root.Add("frames", std::move(frames));
         root.Write(writer);
     } else {
-        std::fprintf(console.pOut, "# %llu frames, %llu key", static_cast<unsigned long long>(uIndex),
-                     static_cast<unsigned long long>(uKeys));
+        std::fprintf(console.pOut, "# %llu frames, %llu key%s", static_cast<unsigned long long>(uIndex),
+                     static_cast<unsigned long long>(uKeys), info.codec == Codec::Hevc ? " (IRAP)" : "");
         if (bH264)
             std::fprintf(console.pOut, ", %llu where the format test misreads the framing",
                          static_cast<unsigned long long>(uDisagree));

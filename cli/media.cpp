@@ -82,8 +82,22 @@ bool ContainsStartCode(const uint8_t *p, size_t uSize, int iValue)
     return false;
 }
 
+// An HEVC unit that may begin a stream (ITU-T H.265 7.3.1.2): a VPS, SPS, PPS, access unit
+// delimiter, prefix SEI or IDR/CRA slice of the base layer with nuh_temporal_id_plus1 1-7. The
+// second header byte then lies in 1-7, which no H.264 SPS (profile_idc), first slice (a
+// first_mb_in_slice of 0 begins with a 1 bit) or PPS (pic_parameter_set_id 0 alike) puts there.
+bool IsHevcStreamStart(const uint8_t *pHeader, size_t uLeft)
+{
+    if (uLeft < 2 || (pHeader[0] & 0x81) != 0 || pHeader[1] == 0 || pHeader[1] > 7)
+        return false;
+    const unsigned uType = pHeader[0] >> 1;
+    return (uType >= CAL_HEVC_NAL_VPS && uType <= CAL_HEVC_NAL_AUD) || uType == CAL_HEVC_NAL_PREFIX_SEI ||
+           (uType >= 19 && uType <= 21); // IDR_W_RADL, IDR_N_LP, CRA_NUT
+}
+
 // Classifies data that begins with a start code: MPEG-4 Visual headers and VOPs, MPEG-1/2
-// sequence and GOP headers, or H.264 NAL units (whose header byte never has bit 7 set).
+// sequence and GOP headers, HEVC NAL units, or H.264 NAL units (whose header byte never has bit
+// 7 set).
 bool DetectStartCodeFormat(const uint8_t *p, size_t uSize, Format &format)
 {
     size_t uAt = 0;
@@ -99,6 +113,8 @@ bool DetectStartCodeFormat(const uint8_t *p, size_t uSize, Format &format)
         size_t uNext = 0;
         const int iNext = NextStartCode(p, uSize, uAt + 3, uNext);
         format = iNext >= 0x20 && iNext <= 0x2F ? Format::Mpeg4Visual : Format::Mpeg12Video;
+    } else if (IsHevcStreamStart(p + uAt + 3, uSize - uAt - 3)) {
+        format = Format::HevcAnnexB;
     } else if (iFirst < 0x80 && ContainsStartCode(p, uSize, 0xB6)) {
         format = Format::Mpeg4Visual;
     } else if (iFirst < 0x80 && (iFirst & 0x1F) != 0) {
@@ -189,9 +205,10 @@ Failure FrameTooLarge(uint64_t uOffset)
 }
 
 // ---------------------------------------------------------------------------------------------
-// Elementary streams split at start codes: H.264 access units (ITU-T H.264 7.4.1.2.3),
-// MPEG-4 Visual VOPs with the headers in front of them, MPEG-1/2 pictures with their sequence
-// and GOP headers, H.263 pictures at their picture start codes.
+// Elementary streams split at start codes: H.264 access units (ITU-T H.264 7.4.1.2.3), HEVC
+// access units (ITU-T H.265 7.4.2.4.4), MPEG-4 Visual VOPs with the headers in front of them,
+// MPEG-1/2 pictures with their sequence and GOP headers, H.263 pictures at their picture start
+// codes.
 class StartCodeReader : public PacketReader {
 public:
     StartCodeReader(Input &input, Format format) : window_(input), format_(format) {}
@@ -233,7 +250,8 @@ private:
     {
         const uint8_t *p = window_.Data();
         const size_t n = window_.Size();
-        const size_t uNeed = format_ == Format::AnnexB ? 5 : 4; // H.264 looks at first_mb_in_slice
+        // H.264 looks at first_mb_in_slice, HEVC at first_slice_segment_in_pic_flag.
+        const size_t uNeed = format_ == Format::AnnexB ? 5 : format_ == Format::HevcAnnexB ? 6 : 4;
         for (; uScan + 3 <= n; ++uScan) {
             const size_t i = uScan;
             if (p[i] != 0 || p[i + 1] != 0)
@@ -255,10 +273,11 @@ private:
                 return window_.AtEnd() ? 0 : -1;
             if (StartsFrame(p + i + 3, n - i - 3)) {
                 uBoundary = i;
-                // H.264: zero bytes in front of a start code (its 4-byte form,
+                // H.264 and HEVC: zero bytes in front of a start code (its 4-byte form,
                 // trailing_zero_8bits) go with the frame that follows, as a NAL unit never ends
-                // in a zero byte (7.4.1). Other video keeps them: its data may end in zeros.
-                while (format_ == Format::AnnexB && uBoundary > 0 && p[uBoundary - 1] == 0)
+                // in a zero byte. Other video keeps them: its data may end in zeros.
+                const bool bNal = format_ == Format::AnnexB || format_ == Format::HevcAnnexB;
+                while (bNal && uBoundary > 0 && p[uBoundary - 1] == 0)
                     --uBoundary;
                 if (uBoundary > 0)
                     return 1;
@@ -284,6 +303,19 @@ private:
                 return bNew;
             }
             return bSeenPicture_ && (t == 6 || t == 7 || t == 8 || t == 9 || (t >= 14 && t <= 18));
+        }
+        case Format::HevcAnnexB: {
+            const unsigned t = (v >> 1) & 0x3F;
+            if (t <= 31) { // a slice segment: first_slice_segment_in_pic_flag begins a picture
+                const bool bFirstSlice = uLeft > 2 && (p[2] & 0x80);
+                const bool bNew = bSeenPicture_ && bFirstSlice;
+                bSeenPicture_ = true;
+                return bNew;
+            }
+            // VPS, SPS, PPS, AUD, prefix SEI and types 41-44 and 48-55 after the last slice of a
+            // picture begin the next access unit.
+            return bSeenPicture_ && (t == 32 || t == 33 || t == 34 || t == 35 || t == 39 || (t >= 41 && t <= 44) ||
+                                     (t >= 48 && t <= 55));
         }
         case Format::Mpeg4Visual: {
             // After a VOP every start code begins the next frame, its headers included.
@@ -542,7 +574,11 @@ void DescribeDump(StreamInfo &info, const Packet *pSecond)
     const std::vector<uint8_t> &c = info.config;
     size_t uAt = 0;
     const int iCode = FirstStartCode(c.data(), c.size(), uAt);
-    if (iCode == 0xB0 || iCode == 0x00 || iCode == 0xB5) {
+    CALHEVCConfig record;
+    if (iCode >= 0 && IsHevcStreamStart(c.data() + uAt + 3, c.size() - uAt - 3)) {
+        info.codec = Codec::Hevc;
+        info.framing = Framing::AnnexB;
+    } else if (iCode == 0xB0 || iCode == 0x00 || iCode == 0xB5) {
         info.codec = Codec::Mpeg4Visual;
     } else if (iCode == 0xB3) {
         info.codec = Codec::Mpeg2Video;
@@ -553,6 +589,12 @@ void DescribeDump(StreamInfo &info, const Packet *pSecond)
         info.codec = Codec::H264;
         info.framing = Framing::LengthPrefixed;
         info.uNalLengthSize = (c[4] & 3u) + 1;
+    } else if (c.size() <= INT32_MAX &&
+               vorCALTools_HEVC_ParseHvcC(c.data(), static_cast<int32_t>(c.size()), &record) == CAL_HEVC_OK &&
+               record.uConfigurationVersion == 1) {
+        info.codec = Codec::Hevc;
+        info.framing = Framing::LengthPrefixed;
+        info.uNalLengthSize = record.uNALLengthSize;
     } else if (pSecond && IsAdtsHeader(pSecond->data.data(), pSecond->data.size())) {
         info.codec = Codec::Aac;
         info.bAdtsFrames = true;
@@ -575,6 +617,16 @@ void DescribeElementary(Format format, const Packet &first, StreamInfo &info)
         info.framing = Framing::AnnexB;
         int32_t iRun = 0;
         if (const uint8_t *pRun = vorCALTools_AVC_ANNEXB_GetConfigStream(d.data(), iLen, &iRun)) {
+            info.config.assign(pRun, pRun + iRun);
+            info.uConfigOffset = first.uOffset + static_cast<uint64_t>(pRun - d.data());
+        }
+        break;
+    }
+    case Format::HevcAnnexB: {
+        info.codec = Codec::Hevc;
+        info.framing = Framing::AnnexB;
+        int32_t iRun = 0;
+        if (const uint8_t *pRun = vorCALTools_HEVC_GetConfigStream(d.data(), iLen, 0, &iRun)) {
             info.config.assign(pRun, pRun + iRun);
             info.uConfigOffset = first.uOffset + static_cast<uint64_t>(pRun - d.data());
         }
@@ -687,7 +739,7 @@ std::unique_ptr<MediaFile> MediaFile::Open(std::unique_ptr<Input> input, Failure
     if (!DetectFormat(head.data(), head.size(), head.size() < kDetectBytes, format)) {
         if (bElseDump)
             return OpenDump(std::move(input), failure);
-        failure.Set(0, "unrecognised data: not MP4/MOV/3GP, H.264, ADTS AAC, AMR, MPEG-4 Visual, H.263, "
+        failure.Set(0, "unrecognised data: not MP4/MOV/3GP, H.264, HEVC, ADTS AAC, AMR, MPEG-4 Visual, H.263, "
                        "MPEG-1/2 video or a frame dump");
         return nullptr;
     }
@@ -722,8 +774,9 @@ std::unique_ptr<MediaFile> MediaFile::Open(std::unique_ptr<Input> input, Failure
             info.uObjectType = track.uObjectType;
             info.config = track.config;
             info.uNalLengthSize = track.uNalLengthSize;
-            info.framing = track.codec == Codec::H264 ? Framing::LengthPrefixed : Framing::None;
-            if (track.codec == Codec::H264 && info.uNalLengthSize == 0)
+            const bool bNal = track.codec == Codec::H264 || track.codec == Codec::Hevc;
+            info.framing = bNal ? Framing::LengthPrefixed : Framing::None;
+            if (bNal && info.uNalLengthSize == 0)
                 info.uNalLengthSize = 4;
             info.uWidth = track.uWidth;
             info.uHeight = track.uHeight;

@@ -33,8 +33,8 @@ struct StreamInfo {
     std::string sampleEntry;     // MP4 sample description ("avc1"); empty elsewhere
     uint32_t uTrackId = 0;
     uint32_t uObjectType = 0;    // 'esds' objectTypeIndication
-    std::vector<uint8_t> config; // avcC record, parameter sets, AudioSpecificConfig, VOL headers
-    Framing framing = Framing::None;             // H.264
+    std::vector<uint8_t> config; // avcC or hvcC record, parameter sets, AudioSpecificConfig, VOL headers
+    Framing framing = Framing::None;             // H.264 and HEVC
     bool bAdtsFrames = false;                    // AAC frames behind ADTS headers (else raw)
     uint32_t uNalLengthSize = 0;
     uint32_t uWidth = 0, uHeight = 0;        // as the container or stream header gives them

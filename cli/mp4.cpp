@@ -445,6 +445,9 @@ bool Mp4File::ParseSampleEntry(size_t uBegin, size_t uEnd, Mp4Track &track, Fail
                 track.config.assign(p, p + uSize);
                 if (TypeIs(box.pType, "avcC") && uSize >= 5)
                     track.uNalLengthSize = (p[4] & 3u) + 1;
+                constexpr size_t kHvcCLengthSizeByte = 21; // lengthSizeMinusOne (ISO/IEC 14496-15 8.3.3.1)
+                if (TypeIs(box.pType, "hvcC") && uSize > kHvcCLengthSizeByte)
+                    track.uNalLengthSize = (p[kHvcCLengthSizeByte] & 3u) + 1;
             } else if (TypeIs(box.pType, "esds")) {
                 ParseEsds(p, uSize, track);
             } else if (TypeIs(box.pType, "pasp") && uSize >= 8) {

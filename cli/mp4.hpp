@@ -29,7 +29,7 @@ struct Mp4Track {
     Codec codec = Codec::Unknown;
     uint32_t uEntryCount = 0;  // sample descriptions in 'stsd'; the first one is read
     uint32_t uObjectType = 0;  // objectTypeIndication of 'esds'
-    std::vector<uint8_t> config; // avcC record, AudioSpecificConfig, MPEG-4 Visual headers
+    std::vector<uint8_t> config; // avcC or hvcC record, AudioSpecificConfig, MPEG-4 Visual headers
     uint32_t uNalLengthSize = 0;
     uint32_t uWidth = 0, uHeight = 0;   // visual sample entry
     uint32_t uSarNum = 0, uSarDen = 0;  // 'pasp'

@@ -57,6 +57,29 @@ void DescribeAvc(const StreamInfo &info, Value &stream)
     stream.Add("sps_tool", SpsToolRecord(facts.uSpsToolResult, tool));
 }
 
+void DescribeHevc(const StreamInfo &info, Value &stream)
+{
+    const HevcFacts facts = ExamineHevc(info);
+    if (facts.sps.empty()) {
+        AddSize(stream, info.uWidth, info.uHeight);
+        stream.Add("sps", "none found in the configuration");
+        return;
+    }
+    if (!facts.bOk) {
+        stream.Add("sps_error", HevcResultName(facts.iResult));
+        AddSize(stream, info.uWidth, info.uHeight);
+        if (info.uWidth && info.uHeight)
+            stream.Add("size_source", "container");
+        return;
+    }
+    if (const std::string profile = HevcProfileName(facts.full); !profile.empty())
+        stream.Add("profile", profile);
+    stream.Add("level", facts.full.uLevelIdc);
+    DescribeFullSps(facts.full, stream);
+    if (!facts.full.uSarDen && info.uSarNum && info.uSarDen)
+        stream.Add("sample_aspect_ratio", Sprintf("%u:%u", info.uSarNum, info.uSarDen));
+}
+
 void DescribeVisual(const StreamInfo &info, const std::vector<uint8_t> &firstFrame, Value &stream)
 {
     const VisualFacts facts = ExamineVisual(info, firstFrame);
@@ -142,6 +165,9 @@ bool DescribeStream(const Console &console, const std::string &path, MediaFile &
     case Codec::H264:
         DescribeAvc(info, stream);
         break;
+    case Codec::Hevc:
+        DescribeHevc(info, stream);
+        break;
     case Codec::Mpeg4Visual:
     case Codec::H263:
     case Codec::Mpeg1Video:
@@ -172,7 +198,7 @@ bool DescribeStream(const Console &console, const std::string &path, MediaFile &
             stream.Add("channels", info.uChannels);
         break;
     }
-    if (info.codec == Codec::H264) {
+    if (info.codec == Codec::H264 || info.codec == Codec::Hevc) {
         stream.Add("framing", FramingName(info.framing));
         if (info.framing == Framing::LengthPrefixed)
             stream.Add("nal_length_size", info.uNalLengthSize);
@@ -194,9 +220,8 @@ bool DescribeStream(const Console &console, const std::string &path, MediaFile &
     return true;
 }
 
-} // namespace
-
-void DescribeFullSps(const FullSps &sps, Value &stream)
+// The picture facts both SPS records name alike.
+template <class Sps> void DescribePicture(const Sps &sps, Value &stream)
 {
     AddSize(stream, sps.uWidth, sps.uHeight);
     stream.Add("coded_width", sps.uCodedWidth);
@@ -214,6 +239,18 @@ void DescribeFullSps(const FullSps &sps, Value &stream)
     stream.Add("chroma_format_idc", sps.uChromaFormatIdc);
     if (sps.uBitDepthChroma != sps.uBitDepthLuma)
         stream.Add("bit_depth_chroma", sps.uBitDepthChroma);
+}
+
+} // namespace
+
+void DescribeFullSps(const FullSps &sps, Value &stream)
+{
+    DescribePicture(sps, stream);
+}
+
+void DescribeFullSps(const CALHEVCSPS &sps, Value &stream)
+{
+    DescribePicture(sps, stream);
 }
 
 int ProbeVerb(Console &console, int argc, char **argv)

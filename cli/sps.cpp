@@ -132,18 +132,116 @@ SpsReport DescribeAvcSps(const std::vector<uint8_t> &nal)
     return report;
 }
 
+// ---- HEVC --------------------------------------------------------------------------------
+
+// The fields of CALHEVCSPS by their syntax names (ITU-T H.265 7.3.2.2, E.2.1); the constraint
+// flags and the compatibility flags in hex.
+struct HevcRow {
+    const char *pName;
+    uint32_t CALHEVCSPS::*pField;
+    bool bHex;
+};
+
+constexpr HevcRow kHevcRows[] = {
+    {"general_profile_space", &CALHEVCSPS::uProfileSpace, false},
+    {"general_tier_flag", &CALHEVCSPS::uTierFlag, false},
+    {"general_profile_idc", &CALHEVCSPS::uProfileIdc, false},
+    {"general_compatibility_flags", &CALHEVCSPS::uProfileCompatibilityFlags, true},
+    {"general_constraint_flags_high", &CALHEVCSPS::uConstraintFlagsHigh, true},
+    {"general_constraint_flags_low", &CALHEVCSPS::uConstraintFlagsLow, true},
+    {"general_level_idc", &CALHEVCSPS::uLevelIdc, false},
+    {"sps_video_parameter_set_id", &CALHEVCSPS::uVPSId, false},
+    {"sps_max_sub_layers", &CALHEVCSPS::uMaxSubLayers, false},
+    {"sps_temporal_id_nesting_flag", &CALHEVCSPS::uTemporalIdNesting, false},
+    {"sps_seq_parameter_set_id", &CALHEVCSPS::uSPSId, false},
+    {"chroma_format_idc", &CALHEVCSPS::uChromaFormatIdc, false},
+    {"separate_colour_plane_flag", &CALHEVCSPS::uSeparateColourPlane, false},
+    {"coded_width", &CALHEVCSPS::uCodedWidth, false},
+    {"coded_height", &CALHEVCSPS::uCodedHeight, false},
+    {"conf_win_left", &CALHEVCSPS::uConfWinLeft, false},
+    {"conf_win_right", &CALHEVCSPS::uConfWinRight, false},
+    {"conf_win_top", &CALHEVCSPS::uConfWinTop, false},
+    {"conf_win_bottom", &CALHEVCSPS::uConfWinBottom, false},
+    {"width", &CALHEVCSPS::uWidth, false},
+    {"height", &CALHEVCSPS::uHeight, false},
+    {"bit_depth_luma", &CALHEVCSPS::uBitDepthLuma, false},
+    {"bit_depth_chroma", &CALHEVCSPS::uBitDepthChroma, false},
+    {"log2_max_pic_order_cnt_lsb", &CALHEVCSPS::uLog2MaxPicOrderCntLsb, false},
+    {"max_dec_pic_buffering", &CALHEVCSPS::uMaxDecPicBuffering, false},
+    {"max_num_reorder_pics", &CALHEVCSPS::uMaxNumReorderPics, false},
+    {"max_latency_increase_plus1", &CALHEVCSPS::uMaxLatencyIncreasePlus1, false},
+    {"log2_min_luma_coding_block_size", &CALHEVCSPS::uLog2MinCbSize, false},
+    {"log2_ctb_size", &CALHEVCSPS::uLog2CtbSize, false},
+    {"scaling_list_enabled_flag", &CALHEVCSPS::uScalingListEnabled, false},
+    {"num_short_term_ref_pic_sets", &CALHEVCSPS::uNumShortTermRefPicSets, false},
+    {"long_term_ref_pics_present_flag", &CALHEVCSPS::uLongTermRefPicsPresent, false},
+    {"num_long_term_ref_pics_sps", &CALHEVCSPS::uNumLongTermRefPicsSps, false},
+    {"sar_num", &CALHEVCSPS::uSarNum, false},
+    {"sar_den", &CALHEVCSPS::uSarDen, false},
+    {"video_full_range_flag", &CALHEVCSPS::uVideoFullRange, false},
+    {"colour_primaries", &CALHEVCSPS::uColourPrimaries, false},
+    {"transfer_characteristics", &CALHEVCSPS::uTransferCharacteristics, false},
+    {"matrix_coeffs", &CALHEVCSPS::uMatrixCoefficients, false},
+    {"num_units_in_tick", &CALHEVCSPS::uNumUnitsInTick, false},
+    {"time_scale", &CALHEVCSPS::uTimeScale, false},
+    {"min_spatial_segmentation_idc", &CALHEVCSPS::uMinSpatialSegmentationIdc, false},
+    {"extension_flags", &CALHEVCSPS::uExtensionFlags, true},
+};
+
+SpsReport DescribeHevcSps(const std::vector<uint8_t> &nal)
+{
+    HevcFacts facts;
+    ExamineHevcSps(nal, facts);
+    SpsReport report;
+    report.bOk = facts.bOk;
+    report.pFullTitle = "vorCALTools_HEVC_ParseSPS";
+    const CALHEVCSPS &f = facts.full;
+    if (facts.bOk) {
+        std::string profile = HevcProfileName(f);
+        if (!profile.empty())
+            report.facts.Add("profile", profile);
+        else
+            profile = Sprintf("general_profile_idc %u", f.uProfileIdc);
+        report.facts.Add("level", f.uLevelIdc);
+        DescribeFullSps(f, report.facts);
+        report.summary = Sprintf("%s, level %u, %ux%u (coded %ux%u), SAR %u:%u, %s, range %s, matrix %s, transfer %s, "
+                                 "primaries %s",
+                                 profile.c_str(), f.uLevelIdc, f.uWidth, f.uHeight, f.uCodedWidth, f.uCodedHeight,
+                                 f.uSarNum, f.uSarDen, PixFmtName(f).c_str(), ColorRangeName(f).c_str(),
+                                 ColorSpaceName(f.uMatrixCoefficients), ColorTransferName(f.uTransferCharacteristics),
+                                 ColorPrimariesName(f.uColourPrimaries));
+    } else {
+        report.error = Sprintf("the full SPS parse failed: %s (%d)", HevcResultName(facts.iResult), facts.iResult);
+    }
+    report.full.Add("result", facts.iResult).Add("result_name", HevcResultName(facts.iResult));
+    report.rows.push_back({"result", Sprintf("%d %s", facts.iResult, HevcResultName(facts.iResult)), ""});
+    for (const HevcRow &row : kHevcRows) {
+        const uint32_t uValue = f.*row.pField;
+        report.full.Add(row.pName, uValue);
+        report.rows.push_back({row.pName, row.bHex ? Sprintf("0x%X", uValue) : std::to_string(uValue), ""});
+    }
+    return report;
+}
+
 // ---- Inputs --------------------------------------------------------------------------------
 
-// The codecs whose parameter sets the verb reads: where their SPS is in raw bytes, and what
-// their parses give.
+bool IsAvcSps(const uint8_t *pUnit, size_t)
+{
+    return (pUnit[0] & 0x1F) == 7;
+}
+
+// The codecs whose parameter sets the verb reads: where their SPS is in raw bytes and which
+// unit of a frame is one, and what their parses give.
 struct SpsCodec {
     Codec codec;
     std::vector<uint8_t> (*pFind)(const std::vector<uint8_t> &data);
+    bool (*pIsSps)(const uint8_t *pUnit, size_t uSize);
     SpsReport (*pDescribe)(const std::vector<uint8_t> &nal);
 };
 
 constexpr SpsCodec kSpsCodecs[] = {
-    {Codec::H264, FindAvcSps, DescribeAvcSps},
+    {Codec::H264, FindAvcSps, IsAvcSps, DescribeAvcSps},
+    {Codec::Hevc, FindHevcSps, IsHevcSps, DescribeHevcSps},
 };
 
 const SpsCodec *CodecEntry(Codec codec)
@@ -228,7 +326,7 @@ bool FromMedia(std::unique_ptr<MediaFile> file, int iStream, ParameterSet &ps, F
     for (uint64_t uIndex = 0; (r = reader->Next(packet, failure)) == ReadResult::Packet; ++uIndex) {
         ForEachNal(packet.data.data(), packet.data.size(), pInfo->framing, pInfo->uNalLengthSize,
                    [&](const uint8_t *p, size_t uSize) {
-                       if (ps.nal.empty() && (p[0] & 0x1F) == 7)
+                       if (ps.nal.empty() && pEntry->pIsSps(p, uSize))
                            ps.nal.assign(p, p + uSize);
                    });
         if (!ps.nal.empty()) {
@@ -337,11 +435,15 @@ int SpsVerb(Console &console, int argc, char **argv)
                      ps.source.c_str(), ps.nal.size(), HexBytes(ps.nal.data(), ps.nal.size(), 24).c_str());
         if (!report.summary.empty())
             std::fprintf(console.pOut, "# %s\n", report.summary.c_str());
-        std::fprintf(console.pOut, "%-32s %-26s %s\n", "field", report.pFullTitle,
-                     report.pToolTitle ? report.pToolTitle : "");
-        for (const auto &[name, full, tool] : report.rows)
-            std::fprintf(console.pOut, "%-32s %-26s %s\n", name.c_str(), full.c_str(),
-                         report.pToolTitle ? tool.c_str() : "");
+        if (report.pToolTitle) {
+            std::fprintf(console.pOut, "%-32s %-26s %s\n", "field", report.pFullTitle, report.pToolTitle);
+            for (const auto &[name, full, tool] : report.rows)
+                std::fprintf(console.pOut, "%-32s %-26s %s\n", name.c_str(), full.c_str(), tool.c_str());
+        } else {
+            std::fprintf(console.pOut, "%-32s %s\n", "field", report.pFullTitle);
+            for (const auto &[name, full, tool] : report.rows)
+                std::fprintf(console.pOut, "%-32s %s\n", name.c_str(), full.c_str());
+        }
     }
     if (!report.bOk) {
         Report(console, arg, report.error);

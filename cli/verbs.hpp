@@ -30,6 +30,7 @@ int SpsVerb(Console &console, int argc, char **argv);
 // The ffprobe-named picture facts of a full SPS parse (size, coded size, SAR, pix_fmt, colour
 // description, bit depth), as probe reports them.
 void DescribeFullSps(const CALAVCSPS &sps, Value &stream);
+void DescribeFullSps(const CALHEVCSPS &sps, Value &stream);
 // What vorCALTools_AVC_GetSPSInfo returned and reported.
 Value SpsToolRecord(uint32_t uResult, const CALSPSInfo &tool);
 

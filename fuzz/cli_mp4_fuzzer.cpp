@@ -25,6 +25,8 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *pData, size_t uSize)
     for (const StreamInfo &info : file->Streams()) {
         if (info.codec == Codec::H264)
             ExamineAvc(info);
+        else if (info.codec == Codec::Hevc)
+            ExamineHevc(info);
         else if (info.codec == Codec::Aac)
             ExamineAacConfig(info);
         std::unique_ptr<PacketReader> reader = file->Packets(info.uIndex);

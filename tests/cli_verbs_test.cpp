@@ -1,6 +1,7 @@
 // The vorcal tool's verbs end to end on the bundled samples and the real-stream fixtures: what
-// probe and frames report against what ffprobe recorded in the sidecars, what convert, replay and
-// silence write, dump listing and extraction, and the command line's usage errors.
+// probe and frames report against what ffprobe recorded in the sidecars (H.264, HEVC, MPEG-4,
+// H.263, MPEG-2, AAC, AMR), what convert, replay and silence write, dump listing and extraction,
+// and the command line's usage errors.
 #include <algorithm>
 #include <cstdio>
 #include <cstdlib>
@@ -18,6 +19,7 @@
 #include <gtest/gtest.h>
 
 #include "bit_writer.hpp"
+#include "hevc_streams.hpp"
 #include "json_reader.hpp"
 #include "verbs.hpp"
 
@@ -778,20 +780,22 @@ TEST(CliSps, HostileInputsEndInOneLine)
         }
     }
     // Every cut and every flipped byte of a real SPS: a record or one line of error, never more.
-    const Outcome ref = Vorcal({"sps", "--json", Data("h264/fullrange_64x48.avcc")});
-    std::string hex = ref.json["sps_bytes"].text;
-    hex.erase(std::remove(hex.begin(), hex.end(), ' '), hex.end());
-    for (size_t uCut = 2; uCut < hex.size(); uCut += 2) {
-        const Outcome run = Vorcal({"sps", hex.substr(0, uCut)});
-        EXPECT_EQ(run.ErrLines(), run.iStatus == 1 ? 1u : 0u) << hex.substr(0, uCut) << run.err;
-        EXPECT_TRUE(run.iStatus == 0 || run.iStatus == 1) << hex.substr(0, uCut);
-        if (uCut < 20) {
-            EXPECT_EQ(run.iStatus, 1) << hex.substr(0, uCut);
+    for (const char *pRecord : {"h264/fullrange_64x48.avcc", "hevc/main10_64x48.hvcc"}) {
+        const Outcome ref = Vorcal({"sps", "--json", Data(pRecord)});
+        std::string hex = ref.json["sps_bytes"].text;
+        hex.erase(std::remove(hex.begin(), hex.end(), ' '), hex.end());
+        for (size_t uCut = 2; uCut < hex.size(); uCut += 2) {
+            const Outcome run = Vorcal({"sps", hex.substr(0, uCut)});
+            EXPECT_EQ(run.ErrLines(), run.iStatus == 1 ? 1u : 0u) << hex.substr(0, uCut) << run.err;
+            EXPECT_TRUE(run.iStatus == 0 || run.iStatus == 1) << hex.substr(0, uCut);
+            if (uCut < 20) {
+                EXPECT_EQ(run.iStatus, 1) << hex.substr(0, uCut);
+            }
+            std::string flipped = hex;
+            flipped[uCut] = flipped[uCut] == 'f' ? '0' : 'f';
+            const Outcome bad = Vorcal({"sps", flipped});
+            EXPECT_EQ(bad.ErrLines(), bad.iStatus == 1 ? 1u : 0u) << flipped << bad.err;
         }
-        std::string flipped = hex;
-        flipped[uCut] = flipped[uCut] == 'f' ? '0' : 'f';
-        const Outcome bad = Vorcal({"sps", flipped});
-        EXPECT_EQ(bad.ErrLines(), bad.iStatus == 1 ? 1u : 0u) << flipped << bad.err;
     }
 }
 
@@ -942,6 +946,165 @@ TEST(CliAac, FramesThatDoNotParseToTheirEndEndInOneLine)
     }
     const Outcome json = Vorcal({"aac", "--json", Data("aac/surround_48000_6ch.aac")});
     EXPECT_EQ(json.json["stream"]["results"]["refused"].Int(), 13);
+}
+
+// ---- HEVC ------------------------------------------------------------------------------------
+
+std::vector<std::string> HevcFixtures()
+{
+    std::vector<std::string> names;
+    for (const auto &entry : std::filesystem::directory_iterator(Data("hevc")))
+        if (entry.path().extension() == ".probe")
+            names.push_back(entry.path().stem().string());
+    std::sort(names.begin(), names.end());
+    return names;
+}
+
+// The units of an hvcC record.
+std::vector<Bytes> RecordUnits(const Bytes &record)
+{
+    std::vector<Bytes> units;
+    CALHEVCNAL u{};
+    while (vorCALTools_HEVC_NextHvcCNAL(record.data(), static_cast<int32_t>(record.size()), &u) == 1)
+        units.emplace_back(u.pUnit, u.pUnit + u.iLen);
+    return units;
+}
+
+TEST(CliHevc, ProbeAndSpsMatchTheFixtureSidecars)
+{
+    const std::vector<std::string> names = HevcFixtures();
+    ASSERT_GE(names.size(), 8u);
+    for (const std::string &name : names) {
+        const auto facts = vorcal::test::ReadProbe(name);
+        // The elementary stream through probe, its record through sps.
+        const Outcome probe = Vorcal({"probe", "--json", Data("hevc/" + name + ".hevc")});
+        const Outcome sps = Vorcal({"sps", "--json", Data("hevc/" + name + ".hvcc")});
+        ASSERT_EQ(probe.iStatus + sps.iStatus, 0) << name << probe.err << sps.err;
+        const Json &stream = probe.json["streams"][0];
+        EXPECT_EQ(stream["codec_name"].text + " " + stream["framing"].text, "hevc annexb") << name;
+        for (const char *pKey : {"profile", "level", "width", "height", "coded_width", "coded_height", "pix_fmt",
+                                 "sample_aspect_ratio", "color_range", "color_space", "color_transfer",
+                                 "color_primaries"}) {
+            EXPECT_EQ(stream[pKey].Scalar(), facts.at(pKey)) << name << " " << pKey;
+            EXPECT_EQ(sps.json[pKey].Scalar(), facts.at(pKey)) << name << " " << pKey;
+        }
+        const Json &s = sps.json["sps"];
+        auto Trace = [&](const char *pName) { return std::stoll(facts.at(std::string("sps.") + pName)); };
+        EXPECT_EQ(s["general_profile_idc"].Int(), Trace("general_profile_idc")) << name;
+        EXPECT_EQ(s["coded_width"].Int(), Trace("pic_width_in_luma_samples")) << name;
+        EXPECT_EQ(s["bit_depth_chroma"].Int(), Trace("bit_depth_chroma_minus8") + 8) << name;
+        EXPECT_EQ(s["log2_max_pic_order_cnt_lsb"].Int(), Trace("log2_max_pic_order_cnt_lsb_minus4") + 4) << name;
+    }
+    // The MP4s: the sample entry, the record's length size, the report's header lines.
+    for (const char *pName : {"main_176x144", "decode_128x96"}) {
+        const Outcome run = Vorcal({"probe", "--json", Data(std::string("hevc/") + pName + ".mp4")});
+        ASSERT_EQ(run.iStatus, 0) << run.err;
+        const auto report = TextSidecar(Data(std::string("hevc/") + pName + ".nal.txt"));
+        const Json &stream = run.json["streams"][0];
+        EXPECT_EQ(stream["codec_tag_string"].text, std::string(pName) == "main_176x144" ? "hev1" : "hvc1");
+        EXPECT_EQ(stream["framing"].text + " " + stream["nal_length_size"].Scalar(), "length-prefixed 4");
+        EXPECT_EQ(stream["extradata_size"].Int(),
+                  static_cast<int64_t>(ReadBytes(Data(std::string("hevc/") + pName + ".hvcc")).size()));
+        for (const char *pKey : {"width", "height", "profile", "level"}) {
+            EXPECT_EQ(stream[pKey].Scalar(), report.at(pKey)) << pName << " " << pKey;
+        }
+        EXPECT_EQ(stream["nb_frames"].Scalar(), report.at("frames")) << pName;
+    }
+}
+
+// The reports' "frame OFFSET SIZE PICT_TYPE KEY" lines. Those of the MP4s have offsets into the
+// samples concatenated (S.nal), so only sizes count there. ffmpeg's parser leaves the zero_byte
+// of an access unit's start code at the end of the packet before; the tool gives it to the
+// access unit it begins (ITU-T H.265 B.2), which then starts a byte earlier.
+TEST(CliHevc, FramesMatchFfprobePackets)
+{
+    for (const char *pFile : {"hevc/main_176x144.hevc", "hevc/main_176x144.mp4", "hevc/decode_128x96.mp4"}) {
+        const std::string file = pFile;
+        const bool bMp4 = file.ends_with(".mp4");
+        const Outcome run = Vorcal({"frames", "--json", Data(file)});
+        ASSERT_EQ(run.iStatus, 0) << file << run.err;
+        std::istringstream in(ReadText(Data(bMp4 ? file.substr(0, file.size() - 4) + ".nal.txt" : file + ".txt")));
+        size_t i = 0;
+        int64_t iEnd = 0;
+        for (std::string word, type; in >> word;) {
+            int64_t iAt = 0, iSize = 0, iKey = 0;
+            if (word != "frame" || !(in >> iAt >> iSize >> type >> iKey)) {
+                std::getline(in, word);
+                continue;
+            }
+            const Json &f = run.json["frames"][i++];
+            EXPECT_EQ(f["pict_type"].text + f["key"].Scalar(), type + std::to_string(iKey)) << file << " " << i - 1;
+            if (bMp4) {
+                EXPECT_EQ(f["size"].Int(), iSize) << file << " " << i - 1;
+                EXPECT_EQ(f["sync"].Int(), iKey) << file << " " << i - 1;
+            } else {
+                EXPECT_TRUE(f["offset"].Int() == iAt || f["offset"].Int() == iAt - 1) << file << " " << i - 1;
+                iEnd = f["offset"].Int() + f["size"].Int();
+            }
+            EXPECT_EQ(f["format_agrees"].Scalar(), "true") << file << " " << i - 1;
+        }
+        EXPECT_EQ(i, run.json["frames"].items.size()) << file;
+        if (!bMp4) {
+            EXPECT_EQ(iEnd, static_cast<int64_t>(ReadBytes(Data(file)).size()));
+        }
+    }
+    // The walk by Table 7-1 names: an IRAP access unit of the session stream.
+    const Outcome run = Vorcal({"frames", Data("hevc/main_176x144.hevc")});
+    EXPECT_NE(run.out.find("AUD_NUT,VPS_NUT,SPS_NUT,PPS_NUT,PREFIX_SEI_NUT,PREFIX_SEI_NUT,PREFIX_SEI_NUT,"
+                           "CRA_NUT,CRA_NUT,SUFFIX_SEI_NUT\n"),
+              std::string::npos)
+        << run.out;
+}
+
+TEST(CliHevc, ConvertWritesTheFiltersUnitsAndTheStreamThatDecodedToTheMp4sFrames)
+{
+    TempDir dir;
+    // hev1: the record's units, then every sample behind start codes: ffmpeg's hevc_mp4toannexb
+    // output unit for unit, less the copies of the record it puts in front of each IRAP slice.
+    ASSERT_EQ(Vorcal({"convert", Data("hevc/main_176x144.mp4"), dir / "m.hevc", "--to", "annexb"}).iStatus, 0);
+    const std::vector<Bytes> record = RecordUnits(ReadBytes(Data("hevc/main_176x144.hvcc")));
+    const std::vector<Bytes> filtered = vorcal::test::HevcUnits(ReadBytes(Data("hevc/main_176x144.mp4toannexb.hevc")));
+    ASSERT_EQ(record.size(), 3u);
+    std::vector<Bytes> expected = record;
+    size_t uCopies = 0;
+    auto Irap = [](const Bytes &u) {
+        return (u[0] >> 1) >= CAL_HEVC_NAL_BLA_W_LP && (u[0] >> 1) <= CAL_HEVC_NAL_RSV_IRAP_VCL23;
+    };
+    for (size_t i = 0; i < filtered.size(); ++i) {
+        const auto at = filtered.begin() + static_cast<ptrdiff_t>(i);
+        if (i + 3 < filtered.size() && std::equal(record.begin(), record.end(), at) && Irap(filtered[i + 3])) {
+            i += 2;
+            ++uCopies;
+            continue;
+        }
+        expected.push_back(filtered[i]);
+    }
+    EXPECT_EQ(uCopies, 2u);
+    EXPECT_EQ(vorcal::test::HevcUnits(ReadBytes(dir / "m.hevc")), expected);
+
+    // hvc1: the very stream fixtures-hevc.sh decoded with ffmpeg to the MP4's frames.
+    ASSERT_EQ(Vorcal({"convert", Data("hevc/decode_128x96.mp4"), dir / "d.hevc", "--to", "annexb"}).iStatus, 0);
+    std::istringstream decode(ReadText(Data("hevc/decode_128x96.decode.txt")));
+    std::string sum;
+    for (std::string line; std::getline(decode, line);)
+        if (line.starts_with("annexb "))
+            sum = line.substr(7);
+    EXPECT_EQ(vorcal::test::Sum(ReadBytes(dir / "d.hevc")), sum);
+
+    // The elementary stream to a dump of length-prefixed frames behind an hvcC record, and with
+    // the in-band parameter sets cut: the dump reads back as the same pictures.
+    const Outcome convert =
+        Vorcal({"convert", Data("hevc/main_176x144.hevc"), dir / "m.dump", "--to", "length", "--strip-ps"});
+    ASSERT_EQ(convert.iStatus, 0) << convert.err;
+    const Outcome es = Vorcal({"frames", "--json", Data("hevc/main_176x144.hevc")});
+    const Outcome dump = Vorcal({"frames", "--json", dir / "m.dump"});
+    ASSERT_EQ(dump.iStatus, 0) << dump.err;
+    ASSERT_EQ(dump.json["frames"].items.size(), 12u);
+    for (size_t i = 0; i < 12; ++i) {
+        const Json &a = es.json["frames"][i], &b = dump.json["frames"][i];
+        EXPECT_EQ(b["pict_type"].text + b["key"].Scalar(), a["pict_type"].text + a["key"].Scalar()) << i;
+        EXPECT_LE(b["nal_unit_types"][0].Int(), 31) << i << " " << b["nal_unit_names"][0].text; // a slice first
+    }
 }
 
 // ---- the command line ----------------------------------------------------------------------

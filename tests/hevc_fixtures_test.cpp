@@ -211,17 +211,9 @@ TEST_F(Session, IrapFramesAreTheKeyFramesAndCarryTheParameterSets)
     EXPECT_EQ(uKeys, 2u);
 }
 
-// FNV-1a over the Annex B stream made of an MP4: the record's units, then every sample
-// converted. fixtures-hevc.sh decoded exactly these bytes of decode_128x96 with ffmpeg to the
-// frames of the MP4 (every picture hash SEI verified) and wrote the sum beside the frame MD5s.
-uint64_t Fnv1a(const Bytes &d)
-{
-    uint64_t h = 0xCBF29CE484222325ull;
-    for (uint8_t b : d)
-        h = (h ^ b) * 0x100000001B3ull;
-    return h;
-}
-
+// The Annex B stream made of an MP4: the record's units, then every sample converted.
+// fixtures-hevc.sh decoded exactly these bytes of decode_128x96 with ffmpeg to the frames of the
+// MP4 (every picture hash SEI verified) and wrote their sum (Sum) beside the frame MD5s.
 Bytes AnnexBOfMp4(const std::string &name)
 {
     const Bytes record = ReadHevcFixture(name + ".hvcc");
@@ -230,13 +222,6 @@ Bytes AnnexBOfMp4(const std::string &name)
     for (const Bytes &s : ReadHevcReport(name + ".nal").packets)
         out = Cat({out, Convert(s, CAL_AVC_FORMAT_NAL, 4)});
     return out;
-}
-
-std::string Sum(const Bytes &d)
-{
-    char text[40];
-    std::snprintf(text, sizeof text, "%zu %016llx", d.size(), static_cast<unsigned long long>(Fnv1a(d)));
-    return text;
 }
 
 TEST(Decode, ConvertedMp4IsTheStreamFfmpegDecodedToTheSameFrames)

@@ -3,6 +3,7 @@
 #pragma once
 
 #include <cstdint>
+#include <cstdio>
 #include <fstream>
 #include <map>
 #include <sstream>
@@ -55,6 +56,17 @@ inline HevcReport ReadHevcReport(const std::string &name)
         }
     }
     return r;
+}
+
+// A stream as decode_128x96.decode.txt records it: "SIZE FNV1A64" (the sum in 16 hex digits).
+inline std::string Sum(const Bytes &d)
+{
+    uint64_t h = 0xCBF29CE484222325ull;
+    for (uint8_t b : d)
+        h = (h ^ b) * 0x100000001B3ull;
+    char text[40];
+    std::snprintf(text, sizeof text, "%zu %016llx", d.size(), static_cast<unsigned long long>(h));
+    return text;
 }
 
 // The "key=value" lines of a .probe sidecar (ffprobe's stream fields and "sps.NAME" elements).

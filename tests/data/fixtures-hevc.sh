@@ -11,10 +11,11 @@
 # every IRAP picture, decoded-picture hash SEI after every picture, HRD parameters in the VUI) also:
 #   S.hevc.txt                what ffprobe reports on S.hevc (format below)
 #   S.nal, S.nal.txt          the MP4 samples concatenated (4-byte lengths) and their report
+#   S.mp4                     the MP4 itself (hev1: parameter sets also inside the samples)
 #   S.mp4toannexb.hevc(.txt)  ffmpeg's hevc_mp4toannexb output for the MP4, samples concatenated
 # For the decode check, decode_128x96: an MP4 straight from the encoder (hvc1: parameter sets in
 # the record only; one slice a picture, B pictures, an MD5 picture hash SEI after every picture):
-#   S.hvcc, S.nal, S.nal.txt  its record, samples and report
+#   S.mp4, S.hvcc, S.nal, S.nal.txt  the MP4, its record, samples and report
 #   S.decode.txt              written only when a build directory is given (below)
 # Report format: "width W", "height H", "profile NAME", "level N", "frames N", then one line
 # per packet in decode order: "frame OFFSET SIZE PICT_TYPE KEY" (KEY 1 for key packets).
@@ -24,6 +25,8 @@
 # record's units, then every sample converted; the test program writes it) and the MP4 itself,
 # requires the same frame MD5s and every picture hash SEI verified, and writes the MD5s with the
 # size and FNV-1a sum of that stream to S.decode.txt, which CI checks the conversion against.
+# `vorcal convert S.mp4 OUT --to annexb` (the tool of the same build) must write that very stream
+# and decode to the same frames.
 # (The multi-slice pictures of main_176x144 do not decode to their picture hashes in ffmpeg 5.1,
 # with or without conversion, so the check uses a single-slice stream.)
 set -eu
@@ -115,7 +118,7 @@ stream $name testsrc2= 176x144 12 \
   keyint=6:min-keyint=6:bframes=2:slices=2:ctu=32:temporal-layers=1:aud=1:repeat-headers=1:hash=2:hrd=1:vbv-maxrate=150:vbv-bufsize=150 \
   -pix_fmt yuv420p -b:v 120k
 report "$out/$name.hevc" "$out/$name.hevc.txt"
-cp "$tmp/$name.nal" "$out/$name.nal"
+cp "$tmp/$name.nal" "$tmp/$name.mp4" "$out/"
 report "$tmp/$name.mp4" "$out/$name.nal.txt" "$tmp/$name.samples" "$out/$name.hevc.txt"
 ffmpeg -y -loglevel error -i "$tmp/$name.mp4" -c copy -bsf:v hevc_mp4toannexb -f hevc "$out/$name.mp4toannexb.hevc"
 # Packet sizes of the filter output (framecrc lists them), turned into the same report.
@@ -141,13 +144,16 @@ PY
 name=decode_128x96
 ffmpeg -y -loglevel error -f lavfi -i "testsrc2=size=128x96:rate=25" -frames:v 12 -pix_fmt yuv420p -c:v libx265 \
   -x265-params "log-level=error:info=0:frame-threads=1:pools=none:keyint=6:min-keyint=6:bframes=2:hash=1" \
-  -b:v 100k -tag:v hvc1 -f mp4 "$tmp/$name.mp4"
+  -b:v 100k -tag:v hvc1 -f mp4 "$out/$name.mp4"
+cp "$out/$name.mp4" "$tmp/$name.mp4"
 python3 "$data/mp4_extract.py" "$tmp/$name.mp4" "$out/$name" >"$tmp/$name.samples"
 report "$tmp/$name.mp4" "$out/$name.nal.txt" "$tmp/$name.samples"
 if [ -n "$build" ]; then
   HEVC_ANNEXB_OUT="$tmp/converted.hevc" "$build/bin/hevc_fixtures_test" --gtest_also_run_disabled_tests \
     --gtest_filter='Decode.DISABLED_WriteConvertedMp4' | grep '^annexb ' >"$tmp/sum"
-  for f in "$tmp/$name.mp4" "$tmp/converted.hevc"; do
+  "$build/bin/vorcal" convert "$out/$name.mp4" "$tmp/tool.hevc" --to annexb >/dev/null
+  cmp "$tmp/converted.hevc" "$tmp/tool.hevc"
+  for f in "$tmp/$name.mp4" "$tmp/converted.hevc" "$tmp/tool.hevc"; do
     # (Probing the raw stream decodes its first picture once more.)
     ffmpeg -loglevel debug -err_detect crccheck -threads 1 -i "$f" -f null - 2>"$tmp/log" >/dev/null
     correct=$(grep -c 'Verifying checksum .*plane 0 - correct.*plane 1 - correct.*plane 2 - correct' "$tmp/log" || true)
@@ -156,8 +162,10 @@ if [ -n "$build" ]; then
     ffmpeg -loglevel error -threads 1 -i "$f" -fps_mode passthrough -f framemd5 - | awk -F', *' '/^0,/ { print $NF }' >"$f.md5"
   done
   cmp "$tmp/$name.mp4.md5" "$tmp/converted.hevc.md5"
+  cmp "$tmp/$name.mp4.md5" "$tmp/tool.hevc.md5"
   {
-    echo "# The Annex B stream made of the MP4 decodes with ffmpeg to the MP4's frames (output order)."
+    echo "# The Annex B stream made of the MP4 (the library's conversion, and vorcal convert --to annexb"
+    echo "# of $name.mp4) decodes with ffmpeg to the MP4's frames (output order)."
     cat "$tmp/sum"
     awk '{ printf "frame %d %s\n", NR - 1, $1 }' "$tmp/$name.mp4.md5"
   } >"$out/$name.decode.txt"

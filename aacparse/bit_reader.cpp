@@ -63,21 +63,3 @@ extern "C" int32_t VrByteAlign_OnlyParsing(VrBitReader_OnlyParsing *pBits)
 {
     return bits::ByteAlign(*pBits);
 }
-
-extern "C" uint32_t get_samplerate_idxOnlyParsing(uint32_t uSampleRate)
-{
-    switch (uSampleRate) {
-    case 96000: return 0;
-    case 88200: return 1;
-    case 64000: return 2;
-    case 48000: return 3;
-    case 32000: return 5;
-    case 24000: return 6;
-    case 22050: return 7;
-    case 16000: return 8;
-    case 12000: return 9;
-    case 11025: return 10;
-    case 8000: return 11;
-    default: return 4; // 44100 and every unknown rate
-    }
-}

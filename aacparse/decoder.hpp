@@ -5,13 +5,9 @@
 
 #include <vorcal/aacparse.h>
 
-namespace vorcal::aacparse {
+#include "aacparse/syntax.hpp"
 
-// Rate in Hz of a sampling_frequency_index; 0 for the reserved and escape values 12-15.
-inline uint32_t RateOf(uint32_t uIndex) noexcept
-{
-    return uIndex < 12 ? VrTBL_SampleRates_OnlyParsing[uIndex] : 0u;
-}
+namespace vorcal::aacparse {
 
 // The samp_rate_infoOnlyParsing row of an index; anything past 15 gets an empty row.
 inline const VrSampRateInfo_OnlyParsing &RateRow(uint32_t uIndex) noexcept

@@ -14,7 +14,7 @@ namespace {
 
 constexpr uint32_t kNoSync = 9;
 constexpr uint32_t kProfileLC = 1;    // ADTS profile 1: AAC LC
-constexpr uint32_t kIndex44100 = 4;
+constexpr uint32_t kIndex44100 = static_cast<uint32_t>(aac::IndexOfRate(44100));
 
 } // namespace
 
@@ -42,13 +42,11 @@ void Reset()
     ResetDecoder(hhDecoder);
 }
 
-} // namespace
-
 uint32_t SbrInfo(const uint8_t *pBuf, uint32_t *pSampleRate, uint32_t *pChannels, uint32_t *pSBR,
                  uint32_t *pBitsAligned, uint32_t *pHeaderBits)
 {
     Reset();
-    if (!pBuf || pBuf[0] != 0xFF || (pBuf[1] & 0xF0) != 0xF0)
+    if (!pBuf || !aac::IsAdtsSync(pBuf))
         return kNoSync;
     // Null outputs go to locals instead of being written through.
     uint32_t uSink[5] = {};
@@ -58,6 +56,7 @@ uint32_t SbrInfo(const uint8_t *pBuf, uint32_t *pSampleRate, uint32_t *pChannels
         pSBR ? pSBR : &uSink[2], pBitsAligned ? pBitsAligned : &uSink[3], pHeaderBits ? pHeaderBits : &uSink[4]));
 }
 
+} // namespace
 } // namespace vorcal::aacparse
 
 extern "C" uint32_t VrAACSBRInfo(const uint8_t *buf, uint32_t /*len*/, uint32_t *pSampleRate, uint32_t *pChannels,

@@ -27,7 +27,6 @@ constexpr uint32_t kSlack = 16384;         // zero bytes behind the frame (see a
 constexpr uint32_t kSbrTail = 1024;        // zero bytes behind an SBR payload copy: an sbr_extension_data
                                            // of one channel reads fewer than 7000 bits whatever its bits
 constexpr uint32_t kMaxPayload = 15 + 255 - 1; // bytes of one fill element's payloads
-constexpr uint32_t kSyncAdts = 0xFFF;
 
 } // namespace
 
@@ -200,17 +199,17 @@ Result EndOfFrame(const Walk &w)
 // blocks, then each block and, in that case, its CRC word (ISO/IEC 13818-7 6.2).
 Result AdtsFrame(CALAACParser &p, const uint8_t *pFrame, uint32_t uLen, CALAACFrameInfo &info, Walk &w)
 {
-    if (uLen < 2 || pFrame[0] != 0xFF || (pFrame[1] & 0xF0) != 0xF0)
+    if (uLen < 2 || !aac::IsAdtsSync(pFrame))
         return kBadInput;
     VrAACDecoder_OnlyParsing &dec = p.dec;
     const bool bCrc = (pFrame[1] & 1) == 0;
     const uint32_t uHeaderBytes = bCrc ? 9 : 7;
     Place(p.aFrame, p.uFrameDirty, pFrame, uLen < uHeaderBytes ? uLen : uHeaderBytes);
     VrInitBits_OnlyParsing(&dec.Bits, p.aFrame);
-    if (bits::Show(dec.Bits, 12) != kSyncAdts || AdtsHeader(dec) != 0)
+    if (AdtsHeader(dec) != 0)
         return kBadInput;
     const VrADTSHeader_OnlyParsing &h = dec.ADTS;
-    info.uSampleRate = RateOf(h.uSampleRateIdx);
+    info.uSampleRate = aac::RateOfIndex(h.uSampleRateIdx);
     info.uChannels = h.uChannelConfig;
     info.uFrameBytes = h.uFrameLength;
     if (uLen < uHeaderBytes || uLen < h.uFrameLength)
@@ -268,16 +267,17 @@ bool AudioSpecificConfig(CALAACParser &p, const uint8_t *pASC, uint32_t uLen)
         uIndex = bits::Get(b, 4);
         if (uIndex == 15) {
             const uint32_t uRate = bits::Get(b, 24);
-            uIndex = get_samplerate_idxOnlyParsing(uRate);
-            return RateOf(uIndex) == uRate;
+            const int32_t iIndex = aac::IndexOfRate(uRate);
+            uIndex = iIndex < 0 ? get_samplerate_idxOnlyParsing(uRate) : uint32_t(iIndex);
+            return iIndex >= 0;
         }
-        return uIndex < 12;
+        return uIndex < aac::kSampleRates.size();
     };
     uint32_t uType = objectType(), uIndex = 0, uExtIndex = 0;
     if (!rateIndex(uIndex))
         return false;
     const uint32_t uConfig = bits::Get(b, 4);
-    p.uAscRate = RateOf(uIndex);
+    p.uAscRate = aac::RateOfIndex(uIndex);
     p.uAscChannels = uConfig;
     if (uType == 5 || uType == 29) {
         p.bExplicitSBR = true;

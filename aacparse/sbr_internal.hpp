@@ -15,6 +15,18 @@ constexpr uint32_t RoundedRatio(uint32_t num, uint32_t fs)
     return fs == 0 ? 0 : static_cast<uint32_t>((2 * uint64_t{num} + fs) / (2 * uint64_t{fs}));
 }
 
+// Insertion sort of n band widths into ascending order.
+constexpr void SortAscending(int32_t *v, int32_t n)
+{
+    for (int32_t i = 1; i < n; ++i) {
+        const int32_t x = v[i];
+        int32_t j = i;
+        for (; j > 0 && v[j - 1] > x; --j)
+            v[j] = v[j - 1];
+        v[j] = x;
+    }
+}
+
 // k0 and k2 from the header's bs_start_freq and bs_stop_freq at the state's rate.
 int32_t StartBand(const VrSBRState_OnlyParsing &sbr);
 int32_t StopBand(const VrSBRState_OnlyParsing &sbr, int32_t k0);

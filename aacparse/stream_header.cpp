@@ -6,25 +6,14 @@
 #include "aacparse/decoder.hpp"
 
 namespace vorcal::aacparse {
-namespace {
-
-constexpr uint32_t kSync = 0xFFF;
-
-// Sync word test on the first two bytes: 0xFF and a second byte with its top four bits set.
-bool AdtsSync(const uint8_t *p) noexcept
-{
-    return p[0] == 0xFF && (p[1] & 0xF0) == 0xF0;
-}
-
-} // namespace
 
 int32_t AdtsHeader(VrAACDecoder_OnlyParsing &dec)
 {
     VrBitReader_OnlyParsing &bits = dec.Bits;
     VrByteAlign_OnlyParsing(&bits);
-    if (VrShowBits_OnlyParsing(&bits, 12) != kSync) {
+    if (VrShowBits_OnlyParsing(&bits, 12) != aac::kAdtsSyncword) {
         VrFlushBits_OnlyParsing(&bits, 8); // one resynchronisation attempt, a byte further on
-        if (VrShowBits_OnlyParsing(&bits, 12) != kSync)
+        if (VrShowBits_OnlyParsing(&bits, 12) != aac::kAdtsSyncword)
             return -1;
     }
     VrFlushBits_OnlyParsing(&bits, 12);
@@ -124,6 +113,8 @@ int32_t ProgramConfig(VrAACDecoder_OnlyParsing &dec)
     return iTag;
 }
 
+namespace {
+
 int32_t AdifHeader(VrAACDecoder_OnlyParsing &dec)
 {
     VrADIFHeader_OnlyParsing &h = dec.ADIF;
@@ -169,9 +160,9 @@ int32_t DecInit(VrAACDecoder_OnlyParsing &dec, const uint8_t *pBuffer, uint32_t 
         VrBookMark_OnlyParsing(&bits, 1);
         AdifHeader(dec);
         uHeaderBits = VrGetProcessedBits_OnlyParsing(&bits);
-        uSampleRate = RateOf(dec.MCInfo.uSampleRateIdx);
+        uSampleRate = aac::RateOfIndex(dec.MCInfo.uSampleRateIdx);
         dec.uReportedChannels = static_cast<uint32_t>(dec.iConfiguredChannels);
-    } else if (AdtsSync(pBuffer)) {
+    } else if (aac::IsAdtsSync(pBuffer)) {
         dec.uADIF = 0;
         dec.uADTS = 1;
         VrInitBits_OnlyParsing(&bits, pBuffer);
@@ -179,7 +170,7 @@ int32_t DecInit(VrAACDecoder_OnlyParsing &dec, const uint8_t *pBuffer, uint32_t 
         VrBookMark_OnlyParsing(&bits, 1);
         AdtsHeader(dec);
         uHeaderBits = VrGetProcessedBits_OnlyParsing(&bits);
-        uSampleRate = RateOf(dec.MCInfo.uSampleRateIdx);
+        uSampleRate = aac::RateOfIndex(dec.MCInfo.uSampleRateIdx);
         dec.uReportedChannels = dec.ADTS.uChannelConfig;
     } else {
         // Headerless: the caller's rate and channel count describe the stream.
@@ -201,6 +192,7 @@ int32_t DecInit(VrAACDecoder_OnlyParsing &dec, const uint8_t *pBuffer, uint32_t 
     return 0;
 }
 
+} // namespace
 } // namespace vorcal::aacparse
 
 using namespace vorcal::aacparse;

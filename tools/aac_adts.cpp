@@ -2,10 +2,13 @@
 // 1.6.2.1 and 1.A.2.2): header size, header from a DSI, frame_length, one-frame recognition.
 #include <vorcal/audio_tools.h>
 
-#include "tools/aac_rates.hpp"
+#include "aacparse/syntax.hpp"
 
 namespace vorcal::tools::aac {
 namespace {
+
+using vorcal::aac::IsAdtsSync;
+using vorcal::aac::kAdtsHeaderSize;
 
 constexpr uint32_t kSbrObjectType = 5;
 
@@ -24,13 +27,11 @@ Dsi ReadDsi(const uint8_t *pDSI) noexcept
                static_cast<uint32_t>((pDSI[1] >> 3) & 0x0Fu)};
 }
 
-} // namespace
-
 int32_t ParseDsi(const uint8_t *pDSI, uint32_t *puSamplingRate, uint32_t *puChannels, uint32_t *puSBR) noexcept
 {
     const Dsi dsi = ReadDsi(pDSI);
     *puChannels = dsi.uChannelConfiguration; // the configuration number, not a channel count
-    *puSamplingRate = RateOfIndex(dsi.uFrequencyIndex);
+    *puSamplingRate = vorcal::aac::RateOfIndex(dsi.uFrequencyIndex);
     *puSBR = dsi.uObjectType == kSbrObjectType ? 1 : 0;
     return 0;
 }
@@ -60,13 +61,14 @@ int32_t IsAdtsFrame(int32_t iLen, const uint8_t *pBuf) noexcept
 {
     if (iLen < static_cast<int32_t>(kAdtsHeaderSize))
         return 0;
-    if (pBuf[0] != 0xFF || (pBuf[1] & 0xF0) != 0xF0)
+    if (!IsAdtsSync(pBuf))
         return 0;
     if (FrameLength(pBuf) != static_cast<uint32_t>(iLen))
         return 0;
     return (pBuf[1] & 1) ? 7 : 9; // protection_absent 0: a 16-bit CRC follows
 }
 
+} // namespace
 } // namespace vorcal::tools::aac
 
 using namespace vorcal::tools;
@@ -80,7 +82,7 @@ extern "C" int32_t vorCALTools_AAC_ParseDSI(const uint8_t *pDSI, uint32_t *puSam
 // 7 even though a header with CRC is 9 bytes long.
 extern "C" int32_t vorCALTools_Get_ADTS_HeaderSize(void)
 {
-    return static_cast<int32_t>(aac::kAdtsHeaderSize);
+    return static_cast<int32_t>(vorcal::aac::kAdtsHeaderSize);
 }
 
 extern "C" int32_t vorCALTools_Make_ADTS_Header(const uint8_t *pDSI, int32_t uFrameLen, uint8_t *pHeader)

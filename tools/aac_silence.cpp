@@ -7,7 +7,7 @@
 #include <vorcal/audio_tools.h>
 
 #include "core/sal.hpp"
-#include "tools/aac_rates.hpp"
+#include "aacparse/syntax.hpp"
 #include "tools/mute_frame.hpp"
 #include "wrapper/codec_slots.hpp"
 
@@ -123,7 +123,7 @@ int32_t AacMuteFrame(uint8_t **ppFrame, uint32_t *puFrameLen, uint32_t /*uReserv
     // The SBR modes pass the output rate; AAC_MakeADTS halves it back to the core rate, so they
     // accept up to 48000 Hz only.
     const uint32_t uHeaderRate = iMode >= kFirstSbrMode ? uSamplingRate * 2 : uSamplingRate;
-    std::array<uint8_t, aac::kAdtsHeaderSize> header{};
+    std::array<uint8_t, vorcal::aac::kAdtsHeaderSize> header{};
     if (AAC_MakeADTS(header.data(), static_cast<int32_t>(uHeaderRate), uChannels, iMode,
                      static_cast<uint32_t>(body.size())) != 0) {
         *puFrameLen = static_cast<uint32_t>(body.size()); // the template length stays behind

@@ -1,15 +1,15 @@
-// Silence frames: the AAC raw-data-block templates behind an optional ADTS header, and the
-// per-instance cache that vorCALTools_GetSilenceFrame fills for AAC, AAC with SBR and DRA.
+// AAC silence frames: the raw-data-block templates behind an optional ADTS header, and the
+// allocation step every mute-frame generator shares. The per-instance cache of
+// vorCALTools_GetSilenceFrame belongs to the codec instance, in the wrapper layer.
 #include <array>
 #include <cstring>
 #include <span>
 
 #include <vorcal/audio_tools.h>
 
-#include "core/sal.hpp"
 #include "aacparse/syntax.hpp"
+#include "core/sal.hpp"
 #include "tools/mute_frame.hpp"
-#include "wrapper/codec_slots.hpp"
 
 namespace vorcal::tools::mute {
 namespace {
@@ -43,52 +43,6 @@ static_assert(kAacMode1[0] == 0x21 && kAacMode3[0] == 0x21);
 constexpr int32_t kFirstSbrMode = 2;
 constexpr uint32_t kMinRate = 8000;
 constexpr uint32_t kMaxRate = 96000;
-
-// AMR storage-format header of frame type 15 (no data) with Q = 1: the AMR-NB and AMR-WB silence.
-constexpr std::array<uint8_t, 1> kAmrNoData = {0x7C};
-
-constexpr uint32_t kNoSilenceFrame = 16;
-
-// Result 16 with the outputs cleared.
-int32_t NoSilenceFrame(const uint8_t **ppFrame, uint32_t *puFrameLen) noexcept
-{
-    *ppFrame = nullptr;
-    *puFrameLen = 0;
-    return static_cast<int32_t>(kNoSilenceFrame);
-}
-
-// Fills an empty cache with an AAC frame of the mode for uChannels (modes[0] mono, modes[1]
-// stereo); a failed build leaves the cache empty so that the next call tries again.
-int32_t FillAacCache(CALCodec *hCodec, const std::array<int32_t, 2> &modes, int32_t iBadChannels,
-                     uint32_t uSamplingRate, uint32_t uChannels, uint32_t uReserved, uint32_t bADTS) noexcept
-{
-    if (hCodec->m_pSilenceFrame)
-        return 0;
-    if (uChannels != 1 && uChannels != 2)
-        return iBadChannels;
-    uint8_t *pFrame = nullptr;
-    uint32_t uLen = 0;
-    const int32_t iResult = AacMuteFrame(&pFrame, &uLen, uReserved, uSamplingRate, uChannels, bADTS,
-                                         modes[uChannels - 1]);
-    if (iResult != 0)
-        return iResult;
-    hCodec->m_pSilenceFrame = pFrame;
-    hCodec->m_uSilenceFrameLen = uLen;
-    return 0;
-}
-
-int32_t FillDraCache(CALCodec *hCodec, uint32_t uSamplingRate, uint32_t uChannels) noexcept
-{
-    if (hCodec->m_pSilenceFrame)
-        return 0;
-    uint8_t *pFrame = nullptr;
-    uint32_t uLen = 0;
-    if (DraMuteFrame(&pFrame, &uLen, uSamplingRate, uChannels) != 0)
-        return -1;
-    hCodec->m_pSilenceFrame = pFrame;
-    hCodec->m_uSilenceFrameLen = uLen;
-    return 0;
-}
 
 } // namespace
 
@@ -132,57 +86,9 @@ int32_t AacMuteFrame(uint8_t **ppFrame, uint32_t *puFrameLen, uint32_t /*uReserv
     return AllocateFrame(header, body, ppFrame, puFrameLen);
 }
 
-int32_t GetSilenceFrame(CALCodec *hCodec, uint32_t uSamplingRate, uint32_t uChannels, uint32_t uReserved,
-                        uint32_t bADTS, const uint8_t **ppFrame, uint32_t *puFrameLen) noexcept
-{
-    if (!hCodec) {
-        VORCAL_TRACE(kTraceError, 0, "[CAL_Tools %d] vorCALTools_GetSilenceFrame() : Codec Handle is NULL....\n",
-                     594);
-        return 1;
-    }
-    const uint32_t uOTI = hCodec->m_uCodecObjectTypeIndication;
-    // Asked on every call, also with a frame cached. An unanswered query reads 0: no frames.
-    if ((uOTI == CAL_OTI_AAC || uOTI == CAL_OTI_AAC_SBR) &&
-        wrapper::AudioPropertyValue(hCodec, CAL_PROP_AAC_SILENCE_FRAMES) == 0)
-        return NoSilenceFrame(ppFrame, puFrameLen);
-
-    int32_t iResult = 0;
-    switch (uOTI) {
-    case CAL_OTI_AAC:
-        iResult = FillAacCache(hCodec, {0, 1}, 1, uSamplingRate, uChannels, uReserved, bADTS);
-        break;
-    case CAL_OTI_AAC_SBR:
-        iResult = FillAacCache(hCodec, {2, 3}, -1, uSamplingRate, uChannels, uReserved, bADTS);
-        break;
-    case CAL_OTI_AMR_NB:
-    case CAL_OTI_AMR_WB:
-        // Static, never cached: the instance's cache may hold the locked AMR frame instead.
-        *ppFrame = kAmrNoData.data();
-        *puFrameLen = kAmrNoData.size();
-        return 0;
-    case CAL_OTI_DRA:
-        iResult = FillDraCache(hCodec, uSamplingRate, uChannels);
-        break;
-    default:
-        return NoSilenceFrame(ppFrame, puFrameLen);
-    }
-    if (iResult != 0)
-        return iResult;
-    *ppFrame = hCodec->m_pSilenceFrame;
-    *puFrameLen = hCodec->m_uSilenceFrameLen;
-    return 0;
-}
-
 } // namespace vorcal::tools::mute
 
 using namespace vorcal::tools;
-
-extern "C" int32_t vorCALTools_GetSilenceFrame(CALCodec *hCodec, uint32_t uSamplingRate, uint32_t uChannels,
-                                               uint32_t uReserved, uint32_t bADTS, const uint8_t **ppFrame,
-                                               uint32_t *puFrameLen)
-{
-    return mute::GetSilenceFrame(hCodec, uSamplingRate, uChannels, uReserved, bADTS, ppFrame, puFrameLen);
-}
 
 extern "C" int32_t AAC_MuteFrame(uint8_t **ppFrame, uint32_t *uFrameLen, uint32_t uReserved, uint32_t uSamplingRate,
                                  uint32_t uChannels, uint32_t bADTS, int32_t uMode)

@@ -4,8 +4,6 @@
 #include <cstdint>
 #include <span>
 
-#include <vorcal/wrapper.h>
-
 namespace vorcal::tools::mute {
 
 // Allocates header + body, copies both and stores buffer and length. When the allocation
@@ -18,7 +16,5 @@ int32_t AacMuteFrame(uint8_t **ppFrame, uint32_t *puFrameLen, uint32_t uReserved
 int32_t AmrNbMuteFrame(uint8_t **ppFrame, uint32_t *puFrameLen, uint32_t uFT) noexcept;
 int32_t AmrWbMuteFrame(uint8_t **ppFrame, uint32_t *puFrameLen, uint32_t uFT) noexcept;
 int32_t DraMuteFrame(uint8_t **ppFrame, uint32_t *puFrameLen, uint32_t uSamplingRate, uint32_t uChannels) noexcept;
-int32_t GetSilenceFrame(CALCodec *hCodec, uint32_t uSamplingRate, uint32_t uChannels, uint32_t uReserved,
-                        uint32_t bADTS, const uint8_t **ppFrame, uint32_t *puFrameLen) noexcept;
 
 } // namespace vorcal::tools::mute

@@ -4,6 +4,7 @@
 
 #include "core/sal.hpp"
 #include "wrapper/codec_slots.hpp"
+#include "wrapper/intermediate.hpp"
 
 using namespace vorcal;
 using namespace vorcal::wrapper;
@@ -35,12 +36,7 @@ extern "C" int32_t vorCAL_VideoDecoderDeinit(CALCodec *hCodec)
 {
     if (!hCodec)
         return -1;
-    // The intermediate H.264 buffer goes only when both its pointer and its size are set.
-    if (hCodec->m_pIntermediateFrame && hCodec->m_iIntermediateFrameSize != 0) {
-        sal::Free(hCodec->m_pIntermediateFrame);
-        hCodec->m_pIntermediateFrame = nullptr;
-        hCodec->m_iIntermediateFrameSize = 0;
-    }
+    ReleaseIntermediate(hCodec);
     return CallSlot<CALUserDataFunc>(hCodec, kSlot2, hCodec->m_uUserData);
 }
 

@@ -7,14 +7,12 @@
 
 #include "core/handle.hpp"
 #include "core/sal.hpp"
+#include "core/version.hpp"
 
 namespace {
 
 // The one handle; plain data, the engine serialises the core calls.
 CALHandle *g_hCAL = nullptr;
-
-constexpr uint32_t kMajorVersion = 1;
-constexpr uint32_t kMinorVersion = 1;
 
 } // namespace
 
@@ -26,7 +24,7 @@ const CALHandle *vorcal::core::LiveHandle() noexcept
 extern "C" CALHandle *vorCAL_GetHandle(uint32_t /*uReserved*/, uint32_t uMajor, uint32_t uMinor)
 {
     // The version test comes first, also when a handle already exists.
-    if (uMajor != kMajorVersion || uMinor != kMinorVersion)
+    if (uMajor != vorcal::version::kMajor || uMinor != vorcal::version::kMinor)
         return nullptr;
     if (g_hCAL) {
         ++g_hCAL->m_uRefCount;

@@ -1,7 +1,8 @@
 # vorcal: convenience targets over CMake.
 #   make run             install a compiler and CMake when missing, build the library, libvorsal, the
 #                        vorcal tool and the example engine, and run the tool on the bundled samples
-#   make test            install GoogleTest too when missing, build everything, run every CTest test
+#   make test            install GoogleTest (and python3) too when missing, build everything, run
+#                        every CTest test
 #   make check-sanitize  the whole suite under AddressSanitizer and UndefinedBehaviorSanitizer
 #   make check-arm       cross-build for 32-bit ARM and run the suite under qemu-arm
 #   make fuzz            build the libFuzzer targets with clang and run each FUZZ_SECONDS seconds

@@ -29,7 +29,7 @@ struct AacCodebooks {
     {
         static const AacCodebooks books = [] {
             AacCodebooks b;
-            std::ifstream spectral(VORCAL_TEST_DATA_DIR "/aac_spectral_codebooks.tsv");
+            std::ifstream spectral(VORCAL_AAC_TABLE_DIR "/aac_spectral_codebooks.tsv");
             std::string line, hex, values;
             int cb = 0, index = 0, length = 0, diff = 0;
             while (std::getline(spectral, line)) // '#' comments; the column header fails the numeric fields
@@ -39,7 +39,7 @@ struct AacCodebooks {
                     for (std::string v; std::getline(list, v, ',');)
                         b.values[{cb, index}].push_back(std::stoi(v));
                 }
-            std::ifstream scalefactor(VORCAL_TEST_DATA_DIR "/aac_scalefactor_codebook.tsv");
+            std::ifstream scalefactor(VORCAL_AAC_TABLE_DIR "/aac_scalefactor_codebook.tsv");
             while (std::getline(scalefactor, line))
                 if (std::istringstream row(line); line[0] != '#' && row >> index >> length >> hex >> diff)
                     b.scalefactor[diff] = {uint32_t(std::stoul(hex, nullptr, 16)), unsigned(length)};

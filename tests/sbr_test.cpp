@@ -1,5 +1,5 @@
 // SBR extension parsing: hand-built sbr_extension_data() payloads, written field by field with
-// the codebooks of tests/data/sbr_huffman.tsv, parsed back (a misread field shifts what follows,
+// the codebooks of aacparse/data/sbr_huffman.tsv, parsed back (a misread field shifts what follows,
 // so the consumed bit count is checked throughout); the trees against the same codebooks.
 #include <gtest/gtest.h>
 
@@ -31,7 +31,7 @@ const std::map<std::string, Codebook> &Codebooks()
 {
     static const auto books = [] {
         std::map<std::string, Codebook> out;
-        std::ifstream in(VORCAL_TEST_DATA_DIR "/sbr_huffman.tsv");
+        std::ifstream in(VORCAL_AAC_TABLE_DIR "/sbr_huffman.tsv");
         std::string line, table, hex;
         int index = 0, value = 0, length = 0;
         while (std::getline(in, line)) // '#' comments; the column header fails the numeric fields

@@ -15,12 +15,6 @@ inline void *Alloc(uint32_t uSize) noexcept
     return (pTable && pTable->Alloc) ? pTable->Alloc(uSize) : nullptr;
 }
 
-template <typename T>
-inline T *AllocArray(uint32_t uCount) noexcept
-{
-    return static_cast<T *>(Alloc(static_cast<uint32_t>(uCount * sizeof(T))));
-}
-
 // Returns a block through slot 2 of the memory table.
 inline void Free(void *pBlock) noexcept
 {

@@ -168,4 +168,24 @@ TEST(AacHeader, AdifProgramsAcceptedOrRefused)
         }
 }
 
+// The right channel of a pair reads the left channel's ics_info exactly when common_window is
+// set, under a program ("fC1") and under the implicit configuration; an element that no
+// program channel carries marks channel 0 with -1 (common_window) or 0.
+TEST(AacChannelMap, CommonWindowSharesTheLeftWindowInfo)
+{
+    VrAACDecoder_OnlyParsing &d = hhDecoder;
+    for (uint32_t common : {0u, 1u}) {
+        SCOPED_TRACE(common);
+        uint32_t bits = 0;
+        RunInit(Adif({"fC1"}, true, false, bits), 8000, 1);
+        EXPECT_EQ(chn_configOnlyParsing(&d, 1, 1, common, &d.MCInfo), 0);
+        EXPECT_EQ(d.MCInfo.Channel[1].iWindowInfoChannel, common ? 0 : 1);
+        EXPECT_EQ(chn_configOnlyParsing(&d, 1, 2, common, &d.MCInfo), -1);
+        EXPECT_EQ(d.MCInfo.Channel[0].iWindowInfoChannel, common ? -1 : 0);
+        RunInit(WithSlack({0, 0}), 44100, 2); // headerless
+        EXPECT_EQ(chn_configOnlyParsing(&d, 1, 0, common, &d.MCInfo), 0);
+        EXPECT_EQ(d.MCInfo.Channel[1].iWindowInfoChannel, common ? 0 : 1);
+    }
+}
+
 } // namespace

@@ -83,13 +83,17 @@ void PutLinearHeader(BitWriter &w, uint32_t ampRes = 1) { PutHeader(w, ampRes, 5
 TEST(SbrBands, LinearAndLogarithmicTables)
 {
     BitWriter w;
-    PutHeader(w, 1, 5, 0, 2, 0, 0, 3); // bs_xover_band 2: the high table starts at kx = 16
+    // bs_xover_band 1: the high table starts at kx = 15 and has seven bands, an odd count, so
+    // the low table takes high borders 0, 1, 3, 5, 7 (2k - 1); round(3 log2(23/15)) = 2 noise
+    // bands over the four low ones.
+    PutHeader(w, 1, 5, 0, 1, 0, 0, 3);
     VrSBRState_OnlyParsing sbr = Fresh(kRate);
     EXPECT_EQ(Parse(w, sbr, 2), All(0, w)); // another element: tables built, no data read
-    EXPECT_EQ(std::make_tuple(Row(sbr.uMaster, sbr.uNumMaster + 1), Row(sbr.uHigh, sbr.uNumHigh + 1), Row(sbr.uLow, sbr.uNumLow + 1),
-                              Row(sbr.uNoiseTable, sbr.uNumNoiseBands + 1)),
-              std::make_tuple(std::vector<int>{14, 15, 16, 17, 18, 19, 20, 21, 23}, std::vector<int>{16, 17, 18, 19, 20, 21, 23},
-                              std::vector<int>{16, 18, 20, 23}, std::vector<int>{16, 18, 23})); // round(3 log2(23/16)) = 2
+    EXPECT_EQ(std::make_tuple(Row(sbr.uMaster, sbr.uNumMaster + 1), Row(sbr.uHigh, sbr.uNumHigh + 1),
+                              Row(sbr.uLow, sbr.uNumLow + 1), Row(sbr.uNoiseTable, sbr.uNumNoiseBands + 1)),
+              std::make_tuple(std::vector<int>{14, 15, 16, 17, 18, 19, 20, 21, 23},
+                              std::vector<int>{15, 16, 17, 18, 19, 20, 21, 23}, std::vector<int>{15, 16, 18, 20, 23},
+                              std::vector<int>{15, 18, 23}));
     // Two regions: k0 = 12, k2 = 55 (ratio 4.58 >= 2.2449), k1 = 24; region 0 has
     // 2 round(12 log2(2) / 2) = 12 bands (bs_freq_scale 1), region 1 2 round(12 log2(55/24) / 2.6)
     // = 12 (bs_alter_scale 1). round(12 2^(k/12)) gives 13 twice: one empty band, sorted first.
@@ -158,29 +162,35 @@ TEST(SbrFrame, EveryFrameClass)
     }
 }
 
-// Time-direction deltas build on the previous envelope (mapping low to high resolution bands)
-// and, for the first envelope, on the last one of the previous frame.
-TEST(SbrFrame, TimeAndFrequencyDeltas)
+// Time-direction deltas build on the previous envelope, and the first envelope of a frame on
+// the last one of the frame before, through the band map between resolutions: with
+// bs_xover_band 1 there are seven high bands 15..21, 23 and four low ones 15 16 18 20 23.
+// A low band k starts where high band 2k - 1 does; a high band builds on the low band that
+// holds its start (high bands 0-6 on low bands 0 1 1 2 2 3 3).
+TEST(SbrFrame, TimeDeltasAcrossResolutions)
 {
     VrSBRState_OnlyParsing sbr = Fresh(kRate);
-    // Frame 1, bs_amp_res 0 (1.5 dB steps): FIXFIX, two high-resolution envelopes; envelope 0
-    // and noise floor 0 along frequency, the second ones in time.
+    // Frame 1, bs_amp_res 0 (1.5 dB steps): VARFIX with four envelopes of resolution low, high,
+    // low, high; envelope 0 and both noise floors along frequency, the rest in time.
     BitWriter w;
-    PutLinearHeader(w, 0);
-    w.Put(0, 1).Put(0, 2).Put(1, 2).Put(1, 1).Put(0b0101, 4).Put(0, 2 * kNoiseBands).Put(40, 7);
-    PutCodes(w, "f_huffman_env_1_5dB", {-1, -2, -3, -4, -5, -6, -7}); // 40, 39, 37, 34, 30, 25, 19, 12
-    PutCodes(w, "t_huffman_env_1_5dB", {-4, -3, -2, -1, 0, 1, 2, 3});
+    PutHeader(w, 0, 5, 0, 1, 0, 0, 3);
+    w.Put(0, 1).Put(2, 2).Put(0, 2).Put(3, 2).Put(0, 6).Put(0, 3).Put(0b0101, 4);
+    w.Put(0b0111, 4).Put(0, 2).Put(0, 2 * kNoiseBands).Put(30, 7);
+    PutCodes(w, "f_huffman_env_1_5dB", {1, 2, 3});           // 30 31 33 36
+    PutCodes(w, "t_huffman_env_1_5dB", {0, 1, 2, 3, 4, 5, 6}); // 30 32 33 36 37 41 42
+    PutCodes(w, "t_huffman_env_1_5dB", std::vector<int>(4 + 7, 0));
     w.Put(10, 5);
-    PutCodes(w, "f_huffman_env_3_0dB", {5});     // 10, 15
-    PutCodes(w, "t_huffman_noise_3_0dB", {-3, 7}); // 7, 22
-    w.Put(0, 2);                            // no harmonics, no extended data
+    PutCodes(w, "f_huffman_env_3_0dB", {5}); // 10, 15
+    w.Put(7, 5);
+    PutCodes(w, "f_huffman_env_3_0dB", {15}); // 7, 22
+    w.Put(0, 2); // no harmonics, no extended data
     EXPECT_EQ(Parse(w, sbr, 0), All(1, w));
-    const std::vector<int> env0 = {40, 39, 37, 34, 30, 25, 19, 12};
-    EXPECT_EQ(std::make_tuple(Row(sbr.iEnvelope[0], kHigh), Row(sbr.iEnvelope[1], kHigh), Row(sbr.iNoise[1], 2)),
-              std::make_tuple(env0, std::vector<int>{36, 36, 35, 33, 30, 26, 21, 15}, std::vector<int>{7, 22}));
+    const std::vector<int> low = {30, 32, 36, 41}, high = {30, 32, 32, 36, 36, 41, 41};
+    EXPECT_EQ(std::make_tuple(Row(sbr.iEnvelope[1], 7), Row(sbr.iEnvelope[2], 4), Row(sbr.iEnvelope[3], 7)),
+              std::make_tuple(std::vector<int>{30, 32, 33, 36, 37, 41, 42}, low, high));
 
-    // Frame 2, no header: FIXFIX, one low-resolution envelope in time over the last high one
-    // (low band k starts where high band 2k does), noise in time over the last floor.
+    // Frame 2, no header: FIXFIX, one low-resolution envelope in time over the last (high) one
+    // of frame 1, noise in time over the last floor.
     BitWriter w2;
     w2.Put(13, 4).Put(0, 7).Put(0b11, 2).Put(0, 2 * kNoiseBands);
     PutCodes(w2, "t_huffman_env_1_5dB", {1, 1, 1, 1});
@@ -188,8 +198,8 @@ TEST(SbrFrame, TimeAndFrequencyDeltas)
     w2.Put(0, 2);
     EXPECT_EQ(Parse(w2, sbr, 0), All(1, w2));
     EXPECT_EQ(sbr.uHeaderCount, 1u);
-    EXPECT_EQ(std::make_pair(Row(sbr.iEnvelope[0], kLow), Row(sbr.iNoise[0], 2)),
-              std::make_pair(std::vector<int>{37, 36, 31, 22}, std::vector<int>{8, 21})); // 1 + bands 0 2 4 6
+    EXPECT_EQ(std::make_pair(Row(sbr.iEnvelope[0], 4), Row(sbr.iNoise[0], 2)),
+              std::make_pair(std::vector<int>{31, 33, 37, 42}, std::vector<int>{8, 21}));
 }
 
 // Results by extended data, CRC, element and band width. Widths k2 - k0 above 32 (from 48 kHz),

@@ -1,5 +1,6 @@
-// The parse-only bit reader (ISO/IEC 14496-3 bit order: most significant bit first). It keeps
-// no end bound by design: the callers of the parse-only decoder pass buffers with slack.
+// The parse-only bit reader (ISO/IEC 14496-3 bit order: most significant bit first).
+// CONTRACT: it keeps no end bound; the callers of the parse-only decoder pass buffers with
+// slack.
 #include <vorcal/aacparse.h>
 
 #include "aacparse/reader.hpp"

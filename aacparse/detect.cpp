@@ -1,5 +1,6 @@
 // The detection entry of the parse-only decoder: resets the one static decoder state and
-// parses the ADTS header of a frame. The raw data block is not read, so SBR is never seen.
+// parses the ADTS header of a frame. CONTRACT: the raw data block is not read, so SBR is never
+// reported.
 #include <cstring>
 
 #include "aacparse/decoder.hpp"

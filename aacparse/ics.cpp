@@ -106,7 +106,8 @@ int32_t ScalefactorDiff(Cursor &c)
 int32_t EscapeOn(VrBitReader_OnlyParsing &b, int32_t iValue)
 {
     uint32_t n = 0;
-    while (Get1(b)) // escape_prefix; more than 8 ones is invalid but read as it comes
+    // CONTRACT: more than 8 ones of escape_prefix is invalid but read as it comes.
+    while (Get1(b))
         ++n;
     const uint32_t uWidth = n + 4;
     uint32_t uWord = 0;

@@ -121,7 +121,8 @@ uint32_t ExtensionPayload(VrAACDecoder_OnlyParsing &dec, uint32_t uCount, uint8_
 {
     VrBitReader_OnlyParsing &b = dec.Bits;
     const uint32_t uBytes = uCount ? uCount - 1 : 0;
-    if (Get(b, 4) != kExtFillData) { // every other type, SBR data included, is stepped over
+    // CONTRACT: every other type, SBR data included, is stepped over unread.
+    if (Get(b, 4) != kExtFillData) {
         bits::Advance(b, 4 + 8 * uBytes);
         return uCount;
     }

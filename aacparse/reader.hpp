@@ -28,8 +28,8 @@ inline void Advance(VrBitReader_OnlyParsing &b, uint32_t n) noexcept
     b.uProcessedBits += n;
 }
 
-// The next n bits from the big-endian word at the current byte; 0 when the shift count
-// 32 - p - n leaves 0..31 (n = 0 at position 0, or n beyond the word).
+// The next n bits from the big-endian word at the current byte. CONTRACT: 0 when the shift
+// count 32 - p - n leaves 0..31 (n = 0 at position 0, or n beyond the word).
 inline uint32_t Show(const VrBitReader_OnlyParsing &b, uint32_t n) noexcept
 {
     const uint8_t *p = b.pCurrent;

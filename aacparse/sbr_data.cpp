@@ -69,7 +69,8 @@ void ParseGrid(VrBitReader_OnlyParsing *pBits, VrSBRState_OnlyParsing *pSbr, uin
 
     switch (uClass) {
     case kFixFix:
-        numEnv = limited(1 << Bits(pBits, 2)); // a code of 3 gives 5 envelopes, not 8
+        // CONTRACT: a code of 3 gives 5 envelopes, not 8.
+        numEnv = limited(1 << Bits(pBits, 2));
         pSbr->uPointer = 0;
         pSbr->uFreqRes[0] = Byte(pBits, 1);
         for (int32_t e = 1; e < numEnv; ++e)
@@ -239,7 +240,8 @@ int32_t ParseSingleChannel(VrBitReader_OnlyParsing *pBits, VrSBRState_OnlyParsin
         uSize += Bits(pBits, 8); // bs_esc_count
     if (uSize == 0)
         return 1;
-    // Only the first extension id is read; the rest of the extended data is left unread.
+    // CONTRACT: only the first extension id is read; the rest of the extended data is left
+    // unread.
     pSbr->uExtensionId = Byte(pBits, 2);
     return pSbr->uExtensionId == kExtensionIdPs ? 2 : 1;
 }
@@ -286,7 +288,8 @@ int32_t vorcal::aacparse::sbr::ExtensionData(VrBitReader_OnlyParsing *pBits, VrS
 
     if (uElementId == 0) // single channel element
         return ParseSingleChannel(pBits, pSbr, pSbr->uTimeRate ? 2 : 1);
-    return uElementId == 1 ? 1 : 0; // channel pair SBR data is not parsed
+    // CONTRACT: channel pair SBR data is not parsed.
+    return uElementId == 1 ? 1 : 0;
 }
 
 extern "C" int32_t sbr_extension_dataOnlyParsing(VrBitReader_OnlyParsing *pBits, VrSBRState_OnlyParsing *pSbr,

@@ -33,8 +33,8 @@ int32_t AdtsHeader(VrAACDecoder_OnlyParsing &dec)
         h.uOriginalCopy = Bits(dec, 1);
         h.uHome = Bits(dec, 1);
     } else {
-        // Skips 16 bits, 18 for MPEG-4, although the fixed header after the sync word is 16
-        // bits either way; kept as the decoder has always done (the flag is never set here).
+        // CONTRACT: skips 16 bits, 18 for MPEG-4, although the fixed header after the sync
+        // word is 16 bits either way (the flag is never set here).
         VrFlushBits_OnlyParsing(&bits, 16);
         if (h.uId == 0)
             VrFlushBits_OnlyParsing(&bits, 2);

@@ -18,7 +18,8 @@ void WriteDumpRecord(const CALHandle *hCAL, uint32_t uSlot, const uint8_t *pData
         return;
     const SALFile hFile = hCAL->m_hDumpFile[uSlot];
     const uint32_t uLen = static_cast<uint32_t>(iLen);
-    // Two writes, length then payload; their results are not examined.
+    // CONTRACT: two writes, the length in host byte order then the payload; their results are
+    // not examined.
     sal::WriteFile(hFile, &uLen, sizeof uLen);
     sal::WriteFile(hFile, pData, uLen);
 }
@@ -30,6 +31,7 @@ extern "C" CALParam vorCAL_DumpFrames(CALHandle *hCAL, const char *pPath, uint32
     using namespace vorcal;
     if (!hCAL || uSlot >= CAL_DUMP_SLOTS)
         return 0;
+    // CONTRACT: the result is the new file handle; with a null path, the result of closing.
     CALParam uResult = 0;
     if (hCAL->m_hDumpFile[uSlot] != 0) {
         uResult = static_cast<CALParam>(sal::CloseFile(hCAL->m_hDumpFile[uSlot]));

@@ -1,5 +1,6 @@
 // Access to the host's system layer (vorSAL): the only way the library allocates memory,
-// writes files and traces. The table pointers are read afresh at every use.
+// writes files and traces. CONTRACT: the table pointers are read afresh at every use, never
+// cached, and only the documented slots are called.
 #pragma once
 
 #include <cstdint>

@@ -30,8 +30,8 @@ constexpr int32_t Interpolate(const std::array<int16_t, N> &t, int32_t y, int ba
 }
 
 // The division family shares its tail: the quotient of two magnitudes, the divisor scaled into
-// 15 bits by c right shifts (c = 0 unless the member scales), with the integer part of the
-// quotient carried as a signed 16-bit number.
+// 15 bits by c right shifts (c = 0 unless the member scales). CONTRACT: the integer part of
+// the quotient is carried as a signed 16-bit number, truncations included.
 enum class Remainder { k16, kSl, kL };
 
 int32_t Quotient(int32_t a, int32_t b, int32_t A, int32_t B, Remainder kind, bool scale)
@@ -145,7 +145,7 @@ extern "C" void Div_exp(int32_t a, int32_t b, int32_t *piInt, int32_t *piFrac)
         *piFrac = 0;
         return;
     }
-    if (b == 0) { // a > 0: no quotient to report
+    if (b == 0) { // CONTRACT: a > 0 over 0 reports (0, 0)
         *piFrac = 0;
         return;
     }
@@ -183,7 +183,7 @@ extern "C" int32_t Mul_ls(int32_t a, int32_t b)
 
 extern "C" void Mul_exp(int32_t e1, int32_t f1, int32_t e2, int32_t f2, int32_t *piInt, int32_t *piFrac)
 {
-    // 32-bit arithmetic throughout.
+    // CONTRACT: 32-bit arithmetic throughout, wrap-around included.
     const int32_t C = To32(int64_t{To32(int64_t{e1} * f2)} + To32(int64_t{f1} * e2));
     int32_t F = To32(int64_t{To32(int64_t{To32(int64_t{f1} * f2)} * 2) >> 16} + (C & 0x7FFF));
     int32_t E = To32(int64_t{To32(int64_t{e1} * e2)} + (To32(int64_t{C} * 2) >> 16));

@@ -83,8 +83,8 @@ inline constexpr std::array<int16_t, 33> kPow2Table = [] {
     return p;
 }();
 
-// About 32768 log2(1 + j / 32), kept as the decoder has always listed it; the last entry is
-// capped at 32767.
+// About 32768 log2(1 + j / 32). CONTRACT: the values as the decoder has always listed them,
+// not recomputed; the last entry is capped at 32767.
 inline constexpr std::array<int16_t, 33> kLog2Table = {
     0,     1455,  2866,  4236,  5568,  6863,  8124,  9352,  10549, 11716, 12855,
     13967, 15054, 16117, 17156, 18172, 19167, 20142, 21097, 22033, 22951, 23852,

@@ -18,8 +18,8 @@ struct Dsi {
     uint32_t uChannelConfiguration;
 };
 
-// audioObjectType (5), samplingFrequencyIndex (4), channelConfiguration (4); the escape forms
-// (object type 31, index 15 with an explicit rate) are not read.
+// audioObjectType (5), samplingFrequencyIndex (4), channelConfiguration (4). CONTRACT: the
+// escape forms (object type 31, index 15 with an explicit rate) are not read.
 Dsi ReadDsi(const uint8_t *pDSI) noexcept
 {
     return Dsi{static_cast<uint32_t>(pDSI[0] >> 3),
@@ -30,7 +30,8 @@ Dsi ReadDsi(const uint8_t *pDSI) noexcept
 int32_t ParseDsi(const uint8_t *pDSI, uint32_t *puSamplingRate, uint32_t *puChannels, uint32_t *puSBR) noexcept
 {
     const Dsi dsi = ReadDsi(pDSI);
-    *puChannels = dsi.uChannelConfiguration; // the configuration number, not a channel count
+    // CONTRACT: the channel count is the configuration number, not a count of channels.
+    *puChannels = dsi.uChannelConfiguration;
     *puSamplingRate = vorcal::aac::RateOfIndex(dsi.uFrequencyIndex);
     *puSBR = dsi.uObjectType == kSbrObjectType ? 1 : 0;
     return 0;
@@ -42,7 +43,8 @@ int32_t MakeHeader(const uint8_t *pDSI, int32_t iRawLen, uint8_t *pHeader) noexc
     const uint32_t uFrameLen = static_cast<uint32_t>(iRawLen) + kAdtsHeaderSize;
     pHeader[0] = 0xFF;
     pHeader[1] = 0xF9; // syncword end, ID 1 (MPEG-2), layer 0, protection_absent 1
-    // Profile 1 (AAC LC) whatever the DSI's object type; the index passes unchecked (12-15 too).
+    // CONTRACT: profile 1 (AAC LC) whatever the DSI's object type; the index passes unchecked
+    // (12-15 too).
     pHeader[2] = static_cast<uint8_t>(0x40 | (dsi.uFrequencyIndex << 2) | ((dsi.uChannelConfiguration >> 2) & 1));
     pHeader[3] = static_cast<uint8_t>(((dsi.uChannelConfiguration & 3) << 6) | ((uFrameLen >> 11) & 3));
     pHeader[4] = static_cast<uint8_t>(uFrameLen >> 3);
@@ -56,7 +58,8 @@ uint32_t FrameLength(const uint8_t *pHeader) noexcept
     return ((pHeader[3] & 3u) << 11) + (static_cast<uint32_t>(pHeader[4]) << 3) + (pHeader[5] >> 5);
 }
 
-// Only the twelve sync bits are examined, not ID or layer; the buffer must be the whole frame.
+// CONTRACT: only the twelve sync bits are examined, not ID or layer; the buffer must be the
+// whole frame.
 int32_t IsAdtsFrame(int32_t iLen, const uint8_t *pBuf) noexcept
 {
     if (iLen < static_cast<int32_t>(kAdtsHeaderSize))
@@ -79,7 +82,7 @@ extern "C" int32_t vorCALTools_AAC_ParseDSI(const uint8_t *pDSI, uint32_t *puSam
     return aac::ParseDsi(pDSI, puSamplingRate, puChannels, puSBR);
 }
 
-// 7 even though a header with CRC is 9 bytes long.
+// CONTRACT: 7 even though a header with CRC is 9 bytes long.
 extern "C" int32_t vorCALTools_Get_ADTS_HeaderSize(void)
 {
     return static_cast<int32_t>(vorcal::aac::kAdtsHeaderSize);

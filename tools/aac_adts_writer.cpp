@@ -7,7 +7,8 @@
 
 namespace {
 
-// The caller zeroes the header; each field is added into its byte (modulo 256).
+// CONTRACT: the caller zeroes the header; each field is added into its byte (modulo 256), so
+// a header that is not zero gets sums.
 void AddTo(uint8_t *pHeader, int i, uint32_t uValue) noexcept
 {
     pHeader[i] = static_cast<uint8_t>(pHeader[i] + uValue);
@@ -23,6 +24,7 @@ extern "C" int32_t mute_get_samplerate_idx(int32_t iSamplingRate)
 extern "C" int32_t AAC_MakeADTS(uint8_t *pHeader, int32_t uSamplingRate, uint32_t uChannels, int32_t uMode,
                                 uint32_t uRawLen)
 {
+    // CONTRACT: traced, and the first three bytes written, before any argument is checked.
     VORCAL_TRACE(vorcal::kTraceAudio, 2, "AAC_MakeADTS() : %u, %u, %u, %u\n", static_cast<unsigned>(uSamplingRate),
                  uChannels, static_cast<unsigned>(uMode), uRawLen);
     AddTo(pHeader, 0, 0xFF);

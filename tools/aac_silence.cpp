@@ -80,7 +80,8 @@ int32_t AacMuteFrame(uint8_t **ppFrame, uint32_t *puFrameLen, uint32_t /*uReserv
     std::array<uint8_t, vorcal::aac::kAdtsHeaderSize> header{};
     if (AAC_MakeADTS(header.data(), static_cast<int32_t>(uHeaderRate), uChannels, iMode,
                      static_cast<uint32_t>(body.size())) != 0) {
-        *puFrameLen = static_cast<uint32_t>(body.size()); // the template length stays behind
+        // CONTRACT: the template length stays behind in the length output.
+        *puFrameLen = static_cast<uint32_t>(body.size());
         return -1;
     }
     return AllocateFrame(header, body, ppFrame, puFrameLen);

@@ -105,7 +105,8 @@ constexpr auto kDra32000 = std::to_array<uint8_t>({
 static_assert(kDra48000.size() == 8 && kDra44100.size() == 8 && kDra32000.size() == 8);
 static_assert(kDra48000[0] == 0x7F && kDra48000[1] == 0xFF);
 
-// The two AMR flavours: templates and their trace lines.
+// The two AMR flavours: templates and their trace lines. CONTRACT: the traces carry the tag
+// [AAC_Mute, and fixed numbers where a source line would stand.
 struct Nb {
     static constexpr const auto &kTemplates = kAmrNb;
     static void Refused() noexcept { VORCAL_TRACE(kTraceError, 0, "[AAC_Mute, %d] AMRNB_MuteFrame Error\n", 252); }

@@ -116,6 +116,7 @@ void PlainTrace(const char *pFormat, ...)
     va_end(args);
 }
 
+// CONTRACT: slot 1 of the memory table and slot 2 of the file table are reserved: null.
 SALMemoryTable g_memoryTable = {MemAlloc, nullptr, MemFree};
 SALFileTable g_fileTable = {FileOpen, FileClose, nullptr, FileWrite};
 SALTraceTable g_traceTable = {PlainTrace};

@@ -17,7 +17,7 @@ bool IsAmr(uint32_t uOTI) noexcept
     return uOTI == CAL_OTI_AMR_NB || uOTI == CAL_OTI_AMR_WB;
 }
 
-// The storage-format header byte (RFC 4867 5.3) shifted right by 3, deliberately unmasked: a
+// The storage-format header byte (RFC 4867 5.3) shifted right by 3. CONTRACT: unmasked, so a
 // set padding bit yields a frame type above 15, which no template has.
 uint32_t FrameTypeOf(const uint8_t *pFrame) noexcept
 {
@@ -97,7 +97,7 @@ void FillAudioStreamParameters(CALCodec *hCodec, const uint8_t *pConfig, int32_t
     case CAL_OTI_AMR_NB:
     case CAL_OTI_NB_SPEECH:
     case CAL_OTI_AMR_WB:
-        // AMR-WB too gets the narrowband values (not 16000 Hz and 320 samples).
+        // CONTRACT: AMR-WB too gets the narrowband values (not 16000 Hz and 320 samples).
         Store(puSamplingRate, 8000);
         Store(puNumOfChannels, 1);
         Store(puBitsPerSample, 16);
@@ -108,7 +108,8 @@ void FillAudioStreamParameters(CALCodec *hCodec, const uint8_t *pConfig, int32_t
     }
 }
 
-// The length is compared first, so a zero-length (or null) frame is never read and is replaced.
+// CONTRACT: the length is compared first, so a zero-length (or null) frame is never read and
+// is replaced.
 AudioFrame SubstituteAMRFrame(const CALCodec *hCodec, AudioFrame frame) noexcept
 {
     if (!IsAmr(hCodec->m_uCodecObjectTypeIndication) || !hCodec->m_pSilenceFrame || hCodec->m_uSilenceFrameLen == 0)

@@ -99,6 +99,7 @@ extern "C" int32_t vorCAL_TextDecoderInit(CALCodec *hCodec, CALParam uParam1, CA
     hCodec->m_uUserData = uUserData;
     const int32_t iResult = CallSlot<CALTextDecoderInitFunc>(hCodec, kSlot1, uParam1, uParam2, uParam3,
                                                              &hCodec->m_uUserData);
+    // CONTRACT: traced after the call, in the documented unbalanced form.
     VORCAL_TRACE(kTraceText, 0, "vorCAL_TextDecoderInit %d]", __LINE__);
     return iResult;
 }

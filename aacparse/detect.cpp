@@ -53,15 +53,17 @@ uint32_t SbrInfo(const uint8_t *pBuf, uint32_t *pSampleRate, uint32_t *pChannels
     uint32_t uSink[5] = {};
     uint32_t uFrameSamples = 0; // channel_configuration x 1024, not reported
     return static_cast<uint32_t>(VrAACDecInitOnlyParsing(
-        hDecoder, pBuf, pSampleRate ? pSampleRate : &uSink[0], pChannels ? pChannels : &uSink[1], &uFrameSamples,
-        pSBR ? pSBR : &uSink[2], pBitsAligned ? pBitsAligned : &uSink[3], pHeaderBits ? pHeaderBits : &uSink[4]));
+        hDecoder, pBuf, pSampleRate ? pSampleRate : &uSink[0], pChannels ? pChannels : &uSink[1],
+        &uFrameSamples, pSBR ? pSBR : &uSink[2], pBitsAligned ? pBitsAligned : &uSink[3],
+        pHeaderBits ? pHeaderBits : &uSink[4]));
 }
 
 } // namespace
 } // namespace vorcal::aacparse
 
-extern "C" uint32_t VrAACSBRInfo(const uint8_t *buf, uint32_t /*len*/, uint32_t *pSampleRate, uint32_t *pChannels,
-                                 uint32_t *pSBR, uint32_t *pBitsAligned, uint32_t *pHeaderBits)
+extern "C" uint32_t VrAACSBRInfo(const uint8_t *buf, uint32_t /*len*/, uint32_t *pSampleRate,
+                                 uint32_t *pChannels, uint32_t *pSBR, uint32_t *pBitsAligned,
+                                 uint32_t *pHeaderBits)
 {
     return vorcal::aacparse::SbrInfo(buf, pSampleRate, pChannels, pSBR, pBitsAligned, pHeaderBits);
 }

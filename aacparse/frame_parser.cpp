@@ -22,10 +22,10 @@
 
 namespace {
 
-constexpr uint32_t kMaxFrame = 8191;       // aac_frame_length is 13 bits; longer access units are refused
+constexpr uint32_t kMaxFrame = 8191; // aac_frame_length is 13 bits; longer access units are refused
 constexpr uint32_t kSlack = 16384;         // zero bytes behind the frame (see above)
-constexpr uint32_t kSbrTail = 1024;        // zero bytes behind an SBR payload copy: an sbr_extension_data
-                                           // of one channel reads fewer than 7000 bits whatever its bits
+constexpr uint32_t kSbrTail = 1024; // zero bytes behind an SBR payload copy: an sbr_extension_data
+                                    // of one channel reads fewer than 7000 bits whatever its bits
 constexpr uint32_t kMaxPayload = 15 + 255 - 1; // bytes of one fill element's payloads
 
 } // namespace
@@ -118,7 +118,8 @@ void SbrPayload(void *pContext, VrAACDecoder_OnlyParsing &dec, uint32_t uCount)
     const uint32_t uBytes = (uEnd + 7) / 8;
     Place(p.aSbr, p.uSbrDirty, dec.Bits.pCurrent, uBytes);
     if (uEnd % 8)
-        p.aSbr[uBytes - 1] &= static_cast<uint8_t>(0xFF00u >> (uEnd % 8)); // the next element's bits
+        // Clears the next element's bits.
+        p.aSbr[uBytes - 1] &= static_cast<uint8_t>(0xFF00u >> (uEnd % 8));
     VrBitReader_OnlyParsing reader;
     VrInitBits_OnlyParsing(&reader, p.aSbr);
     bits::Advance(reader, uBitPos);
@@ -197,7 +198,8 @@ Result EndOfFrame(const Walk &w)
 
 // adts_frame(): header, the raw_data_block_position words of a protected frame with several
 // blocks, then each block and, in that case, its CRC word (ISO/IEC 13818-7 6.2).
-Result AdtsFrame(CALAACParser &p, const uint8_t *pFrame, uint32_t uLen, CALAACFrameInfo &info, Walk &w)
+Result AdtsFrame(CALAACParser &p, const uint8_t *pFrame, uint32_t uLen, CALAACFrameInfo &info,
+                 Walk &w)
 {
     if (uLen < 2 || !aac::IsAdtsSync(pFrame))
         return kBadInput;
@@ -221,7 +223,8 @@ Result AdtsFrame(CALAACParser &p, const uint8_t *pFrame, uint32_t uLen, CALAACFr
     StartSbr(p, info.uSampleRate);
     const bool bBlockCrc = bCrc && h.uRawDataBlocks > 0;
     if (bBlockCrc)
-        bits::Advance(dec.Bits, 16 * h.uRawDataBlocks); // raw_data_block_position; the header read crc_check
+        // raw_data_block_position; the header read crc_check.
+        bits::Advance(dec.Bits, 16 * h.uRawDataBlocks);
     for (uint32_t i = 0; i <= h.uRawDataBlocks; ++i) {
         const Result r = RawDataBlock(w);
         if (r != kOk)
@@ -232,7 +235,8 @@ Result AdtsFrame(CALAACParser &p, const uint8_t *pFrame, uint32_t uLen, CALAACFr
     return EndOfFrame(w);
 }
 
-Result RawFrame(CALAACParser &p, const uint8_t *pFrame, uint32_t uLen, CALAACFrameInfo &info, Walk &w)
+Result RawFrame(CALAACParser &p, const uint8_t *pFrame, uint32_t uLen, CALAACFrameInfo &info,
+                Walk &w)
 {
     info.uFrameBytes = uLen;
     if (!p.bUsable || uLen > kMaxFrame)
@@ -303,7 +307,8 @@ bool AudioSpecificConfig(CALAACParser &p, const uint8_t *pASC, uint32_t uLen)
     }
     if (uExtensionFlag)
         bits::Get1(b); // extensionFlag3
-    if (!p.bExplicitSBR && left() >= 16 && bits::Get(b, 11) == 0x2B7 && objectType() == 5 && bits::Get1(b)) {
+    if (!p.bExplicitSBR && left() >= 16 && bits::Get(b, 11) == 0x2B7 && objectType() == 5 &&
+        bits::Get1(b)) {
         p.bExplicitSBR = true;
         rateIndex(uExtIndex);
         if (left() >= 12 && bits::Get(b, 11) == 0x548)
@@ -369,8 +374,8 @@ extern "C" CALAACParser *vorCALTools_AAC_CreateParser(const uint8_t *pASC, int32
     return vorcal::aacparse::Create(pASC, iASCLen);
 }
 
-extern "C" int32_t vorCALTools_AAC_ParseFrame(CALAACParser *hParser, const uint8_t *pFrame, int32_t iLen,
-                                              CALAACFrameInfo *pInfo)
+extern "C" int32_t vorCALTools_AAC_ParseFrame(CALAACParser *hParser, const uint8_t *pFrame,
+                                              int32_t iLen, CALAACFrameInfo *pInfo)
 {
     return vorcal::aacparse::ParseFrame(hParser, pFrame, iLen, pInfo);
 }

@@ -60,7 +60,8 @@ void RandVector(int16_t *piVector, int16_t &iExponent, int32_t iLength, int32_t 
 
 } // namespace vorcal::aacparse
 
-extern "C" void gen_rand_vectorOnlyParsing(int16_t *piVector, int16_t *piExponent, int32_t iLength, int32_t *piSeed)
+extern "C" void gen_rand_vectorOnlyParsing(int16_t *piVector, int16_t *piExponent, int32_t iLength,
+                                           int32_t *piSeed)
 {
     vorcal::aacparse::RandVector(piVector, *piExponent, iLength, *piSeed);
 }

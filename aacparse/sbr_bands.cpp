@@ -37,7 +37,8 @@ int32_t RegionBands(int32_t bands, int32_t kLo, int32_t kHi, int32_t warpQ14)
 }
 
 // The master table into master[0..return]; -1 when it cannot be built within 64 bands.
-int32_t MasterTable(int32_t k0, int32_t k2, uint32_t uFreqScale, uint32_t uAlterScale, int32_t *master)
+int32_t MasterTable(int32_t k0, int32_t k2, uint32_t uFreqScale, uint32_t uAlterScale,
+                    int32_t *master)
 {
     int32_t width[2 * kMaxBands];
     int32_t numBands = 0;
@@ -51,7 +52,8 @@ int32_t MasterTable(int32_t k0, int32_t k2, uint32_t uFreqScale, uint32_t uAlter
             width[k] = dk;
         int32_t k2Diff = k2 - (k0 + numBands * dk);
         const int32_t incr = k2Diff > 0 ? -1 : 1;
-        for (int32_t k = k2Diff > 0 ? numBands - 1 : 0; k2Diff != 0 && k >= 0 && k < numBands; k += incr) {
+        for (int32_t k = k2Diff > 0 ? numBands - 1 : 0; k2Diff != 0 && k >= 0 && k < numBands;
+             k += incr) {
             width[k] -= incr;
             k2Diff += incr;
         }

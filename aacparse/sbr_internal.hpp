@@ -38,10 +38,12 @@ bool BuildBandTables(VrSBRState_OnlyParsing *pSbr, int32_t k0, int32_t k2);
 
 // sbr_single_channel_element() with borders in units of uBorderUnit time slots; returns 2 for
 // parametric stereo extended data, else 1.
-int32_t ParseSingleChannel(VrBitReader_OnlyParsing *pBits, VrSBRState_OnlyParsing *pSbr, uint32_t uBorderUnit);
+int32_t ParseSingleChannel(VrBitReader_OnlyParsing *pBits, VrSBRState_OnlyParsing *pSbr,
+                           uint32_t uBorderUnit);
 
 // sbr_extension_dataOnlyParsing, also telling whether the band tables of the header in force
 // could be built (false: band limits exceeded, no data parsed).
-int32_t ExtensionData(VrBitReader_OnlyParsing *pBits, VrSBRState_OnlyParsing *pSbr, uint32_t uElementId, bool &bTables);
+int32_t ExtensionData(VrBitReader_OnlyParsing *pBits, VrSBRState_OnlyParsing *pSbr,
+                      uint32_t uElementId, bool &bTables);
 
 } // namespace vorcal::aacparse::sbr

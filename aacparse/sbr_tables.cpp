@@ -37,8 +37,14 @@ extern "C" constexpr uint8_t stopDk_t_tableOnlyParsing[12][14] = {
 namespace vorcal::aacparse::sbr {
 namespace {
 
-constexpr uint32_t StopMin(uint32_t fs) { return RoundedRatio(fs < 32000 ? 768000 : fs < 64000 ? 1024000 : 1280000, fs); }
-constexpr uint32_t StartMin(uint32_t fs) { return RoundedRatio(fs < 32000 ? 384000 : fs < 64000 ? 512000 : 640000, fs); }
+constexpr uint32_t StopMin(uint32_t fs)
+{
+    return RoundedRatio(fs < 32000 ? 768000 : fs < 64000 ? 1024000 : 1280000, fs);
+}
+constexpr uint32_t StartMin(uint32_t fs)
+{
+    return RoundedRatio(fs < 32000 ? 384000 : fs < 64000 ? 512000 : 640000, fs);
+}
 
 #if defined(__SIZEOF_INT128__)
 // The stop-band rows are checked where the compiler has 128-bit integers (64-bit hosts); the
@@ -95,7 +101,8 @@ int32_t StartBand(const VrSBRState_OnlyParsing &sbr)
         row = 3;
     else if (fs > 64000)
         row = 5;
-    return static_cast<uint8_t>(StartMin(fs) + qmf_channel_offsetOnlyParsing[row][sbr.uStartFreq & 15]);
+    return static_cast<uint8_t>(StartMin(fs) +
+                                qmf_channel_offsetOnlyParsing[row][sbr.uStartFreq & 15]);
 }
 
 int32_t StopBand(const VrSBRState_OnlyParsing &sbr, int32_t k0)

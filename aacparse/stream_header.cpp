@@ -141,8 +141,9 @@ int32_t AdifHeader(VrAACDecoder_OnlyParsing &dec)
     return uCounted ? 1 : -1;
 }
 
-int32_t DecInit(VrAACDecoder_OnlyParsing &dec, const uint8_t *pBuffer, uint32_t &uSampleRate, uint32_t &uChannels,
-                uint32_t &uFrameSamples, uint32_t &uSBR, uint32_t &uBitsAligned, uint32_t &uHeaderBits)
+int32_t DecInit(VrAACDecoder_OnlyParsing &dec, const uint8_t *pBuffer, uint32_t &uSampleRate,
+                uint32_t &uChannels, uint32_t &uFrameSamples, uint32_t &uSBR,
+                uint32_t &uBitsAligned, uint32_t &uHeaderBits)
 {
     VrBitReader_OnlyParsing &bits = dec.Bits;
     uSBR = 0;
@@ -198,11 +199,12 @@ int32_t DecInit(VrAACDecoder_OnlyParsing &dec, const uint8_t *pBuffer, uint32_t 
 using namespace vorcal::aacparse;
 
 extern "C" int32_t VrAACDecInitOnlyParsing(VrAACDecoder_OnlyParsing *pDec, const uint8_t *pBuffer,
-                                           uint32_t *puSampleRate, uint32_t *puChannels, uint32_t *puFrameSamples,
-                                           uint32_t *puSBR, uint32_t *puBitsAligned, uint32_t *puHeaderBits)
+                                           uint32_t *puSampleRate, uint32_t *puChannels,
+                                           uint32_t *puFrameSamples, uint32_t *puSBR,
+                                           uint32_t *puBitsAligned, uint32_t *puHeaderBits)
 {
-    return DecInit(*pDec, pBuffer, *puSampleRate, *puChannels, *puFrameSamples, *puSBR, *puBitsAligned,
-                   *puHeaderBits);
+    return DecInit(*pDec, pBuffer, *puSampleRate, *puChannels, *puFrameSamples, *puSBR,
+                   *puBitsAligned, *puHeaderBits);
 }
 
 extern "C" int32_t get_adts_headerOnlyParsing(VrAACDecoder_OnlyParsing *pDec)

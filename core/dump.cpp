@@ -12,7 +12,8 @@ bool IsDumpOpen(const CALHandle *hCAL, uint32_t uSlot) noexcept
     return hCAL && hCAL == LiveHandle() && uSlot < CAL_DUMP_SLOTS && hCAL->m_hDumpFile[uSlot] != 0;
 }
 
-void WriteDumpRecord(const CALHandle *hCAL, uint32_t uSlot, const uint8_t *pData, int32_t iLen) noexcept
+void WriteDumpRecord(const CALHandle *hCAL, uint32_t uSlot, const uint8_t *pData,
+                     int32_t iLen) noexcept
 {
     if (!IsDumpOpen(hCAL, uSlot) || iLen < 0 || (!pData && iLen != 0))
         return;

@@ -50,7 +50,8 @@ constexpr Text<3 * kNumberChars> MakeVersion()
     return text;
 }
 
-constexpr std::size_t kInfoChars = sizeof kInfoPrefix - 1 + 3 * kNumberChars + sizeof kInfoSuffix - 1;
+constexpr std::size_t kInfoChars =
+    sizeof kInfoPrefix - 1 + 3 * kNumberChars + sizeof kInfoSuffix - 1;
 
 constexpr Text<kInfoChars> MakeVersionInfo()
 {

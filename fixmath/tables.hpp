@@ -77,7 +77,9 @@ inline constexpr std::array<int16_t, 49> kInvSqrtTable = [] {
 inline constexpr std::array<int16_t, 33> kPow2Table = [] {
     std::array<int16_t, 33> p{};
     for (int j = 0; j < 33; ++j) {
-        const auto v = static_cast<int32_t>((detail::kPow2Q30[j] * 16384 + (uint64_t{1} << (detail::kPow2Q - 1))) >> detail::kPow2Q);
+        const auto v = static_cast<int32_t>(
+            (detail::kPow2Q30[j] * 16384 + (uint64_t{1} << (detail::kPow2Q - 1))) >>
+            detail::kPow2Q);
         p[j] = static_cast<int16_t>(v > 32767 ? 32767 : v);
     }
     return p;

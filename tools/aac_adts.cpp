@@ -27,7 +27,8 @@ Dsi ReadDsi(const uint8_t *pDSI) noexcept
                static_cast<uint32_t>((pDSI[1] >> 3) & 0x0Fu)};
 }
 
-int32_t ParseDsi(const uint8_t *pDSI, uint32_t *puSamplingRate, uint32_t *puChannels, uint32_t *puSBR) noexcept
+int32_t ParseDsi(const uint8_t *pDSI, uint32_t *puSamplingRate, uint32_t *puChannels,
+                 uint32_t *puSBR) noexcept
 {
     const Dsi dsi = ReadDsi(pDSI);
     // CONTRACT: the channel count is the configuration number, not a count of channels.
@@ -45,8 +46,10 @@ int32_t MakeHeader(const uint8_t *pDSI, int32_t iRawLen, uint8_t *pHeader) noexc
     pHeader[1] = 0xF9; // syncword end, ID 1 (MPEG-2), layer 0, protection_absent 1
     // CONTRACT: profile 1 (AAC LC) whatever the DSI's object type; the index passes unchecked
     // (12-15 too).
-    pHeader[2] = static_cast<uint8_t>(0x40 | (dsi.uFrequencyIndex << 2) | ((dsi.uChannelConfiguration >> 2) & 1));
-    pHeader[3] = static_cast<uint8_t>(((dsi.uChannelConfiguration & 3) << 6) | ((uFrameLen >> 11) & 3));
+    pHeader[2] = static_cast<uint8_t>(0x40 | (dsi.uFrequencyIndex << 2) |
+                                      ((dsi.uChannelConfiguration >> 2) & 1));
+    pHeader[3] =
+        static_cast<uint8_t>(((dsi.uChannelConfiguration & 3) << 6) | ((uFrameLen >> 11) & 3));
     pHeader[4] = static_cast<uint8_t>(uFrameLen >> 3);
     pHeader[5] = static_cast<uint8_t>(((uFrameLen & 7) << 5) | 0x1F);
     pHeader[6] = 0xFC; // buffer fullness 0x7FF (variable bit rate), one raw data block
@@ -76,8 +79,8 @@ int32_t IsAdtsFrame(int32_t iLen, const uint8_t *pBuf) noexcept
 
 using namespace vorcal::tools;
 
-extern "C" int32_t vorCALTools_AAC_ParseDSI(const uint8_t *pDSI, uint32_t *puSamplingRate, uint32_t *puChannels,
-                                            uint32_t *puSBR)
+extern "C" int32_t vorCALTools_AAC_ParseDSI(const uint8_t *pDSI, uint32_t *puSamplingRate,
+                                            uint32_t *puChannels, uint32_t *puSBR)
 {
     return aac::ParseDsi(pDSI, puSamplingRate, puChannels, puSBR);
 }
@@ -88,7 +91,8 @@ extern "C" int32_t vorCALTools_Get_ADTS_HeaderSize(void)
     return static_cast<int32_t>(vorcal::aac::kAdtsHeaderSize);
 }
 
-extern "C" int32_t vorCALTools_Make_ADTS_Header(const uint8_t *pDSI, int32_t uFrameLen, uint8_t *pHeader)
+extern "C" int32_t vorCALTools_Make_ADTS_Header(const uint8_t *pDSI, int32_t uFrameLen,
+                                                uint8_t *pHeader)
 {
     return aac::MakeHeader(pDSI, uFrameLen, pHeader);
 }

@@ -21,12 +21,13 @@ extern "C" int32_t mute_get_samplerate_idx(int32_t iSamplingRate)
     return iSamplingRate < 0 ? -1 : vorcal::aac::IndexOfRate(static_cast<uint32_t>(iSamplingRate));
 }
 
-extern "C" int32_t AAC_MakeADTS(uint8_t *pHeader, int32_t uSamplingRate, uint32_t uChannels, int32_t uMode,
-                                uint32_t uRawLen)
+extern "C" int32_t AAC_MakeADTS(uint8_t *pHeader, int32_t uSamplingRate, uint32_t uChannels,
+                                int32_t uMode, uint32_t uRawLen)
 {
     // CONTRACT: traced, and the first three bytes written, before any argument is checked.
-    VORCAL_TRACE(vorcal::kTraceAudio, 2, "AAC_MakeADTS() : %u, %u, %u, %u\n", static_cast<unsigned>(uSamplingRate),
-                 uChannels, static_cast<unsigned>(uMode), uRawLen);
+    VORCAL_TRACE(vorcal::kTraceAudio, 2, "AAC_MakeADTS() : %u, %u, %u, %u\n",
+                 static_cast<unsigned>(uSamplingRate), uChannels, static_cast<unsigned>(uMode),
+                 uRawLen);
     AddTo(pHeader, 0, 0xFF);
     AddTo(pHeader, 1, 0xF9); // syncword end, ID 1 (MPEG-2), layer 0, protection_absent 1
     AddTo(pHeader, 2, 0x80); // profile 2

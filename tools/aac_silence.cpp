@@ -32,8 +32,8 @@ constexpr auto kAacMode4 = std::to_array<uint8_t>({
     0x00, 0xD0, 0x30, 0x83, 0xE2, 0x5B, 0x66, 0x39, 0x40, 0xCC, 0x9B, 0x37, 0x14, 0x05, 0xD0, 0x40,
     0x00, 0x00, 0x00, 0x03, 0x89, 0x50, 0x40, 0x38});
 
-constexpr std::array<std::span<const uint8_t>, 5> kAacModes = {kAacMode0, kAacMode1, kAacMode2, kAacMode3,
-                                                               kAacMode4};
+constexpr std::array<std::span<const uint8_t>, 5> kAacModes = {kAacMode0, kAacMode1, kAacMode2,
+                                                               kAacMode3, kAacMode4};
 static_assert(kAacMode0.size() == 11 && kAacMode1.size() == 17 && kAacMode2.size() == 22 &&
               kAacMode3.size() == 31 && kAacMode4.size() == 24);
 // id_syn_ele: ID_SCE (0) for the mono templates, ID_CPE (1) with element tag 0 for the stereo ones.
@@ -46,8 +46,8 @@ constexpr uint32_t kMaxRate = 96000;
 
 } // namespace
 
-int32_t AllocateFrame(std::span<const uint8_t> header, std::span<const uint8_t> body, uint8_t **ppFrame,
-                      uint32_t *puFrameLen) noexcept
+int32_t AllocateFrame(std::span<const uint8_t> header, std::span<const uint8_t> body,
+                      uint8_t **ppFrame, uint32_t *puFrameLen) noexcept
 {
     const uint32_t uLen = static_cast<uint32_t>(header.size() + body.size());
     auto *pFrame = static_cast<uint8_t *>(sal::Alloc(uLen));
@@ -62,8 +62,9 @@ int32_t AllocateFrame(std::span<const uint8_t> header, std::span<const uint8_t> 
     return 0;
 }
 
-int32_t AacMuteFrame(uint8_t **ppFrame, uint32_t *puFrameLen, uint32_t /*uReserved*/, uint32_t uSamplingRate,
-                     uint32_t uChannels, uint32_t bADTS, int32_t iMode) noexcept
+int32_t AacMuteFrame(uint8_t **ppFrame, uint32_t *puFrameLen, uint32_t /*uReserved*/,
+                     uint32_t uSamplingRate, uint32_t uChannels, uint32_t bADTS,
+                     int32_t iMode) noexcept
 {
     if (!ppFrame || !puFrameLen)
         return -1;
@@ -91,8 +92,10 @@ int32_t AacMuteFrame(uint8_t **ppFrame, uint32_t *puFrameLen, uint32_t /*uReserv
 
 using namespace vorcal::tools;
 
-extern "C" int32_t AAC_MuteFrame(uint8_t **ppFrame, uint32_t *uFrameLen, uint32_t uReserved, uint32_t uSamplingRate,
-                                 uint32_t uChannels, uint32_t bADTS, int32_t uMode)
+extern "C" int32_t AAC_MuteFrame(uint8_t **ppFrame, uint32_t *uFrameLen, uint32_t uReserved,
+                                 uint32_t uSamplingRate, uint32_t uChannels, uint32_t bADTS,
+                                 int32_t uMode)
 {
-    return mute::AacMuteFrame(ppFrame, uFrameLen, uReserved, uSamplingRate, uChannels, bADTS, uMode);
+    return mute::AacMuteFrame(ppFrame, uFrameLen, uReserved, uSamplingRate, uChannels, bADTS,
+                              uMode);
 }

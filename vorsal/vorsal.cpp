@@ -60,7 +60,8 @@ bool Enabled(int32_t iCategory, int32_t iLevel)
 {
     if (!g_filter.bParsed)
         ParseFilter(g_filter);
-    return iCategory >= 0 && iCategory <= kMaxCategory && iLevel >= 0 && iLevel <= g_filter.aMaxLevel[iCategory];
+    return iCategory >= 0 && iCategory <= kMaxCategory && iLevel >= 0 &&
+           iLevel <= g_filter.aMaxLevel[iCategory];
 }
 
 void VPrint(int32_t iCategory, int32_t iLevel, const char *pFormat, va_list args)

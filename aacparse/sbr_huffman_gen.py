@@ -73,6 +73,12 @@ def main():
     for name in ORDER:
         nodes = tree(books[name])
         assert len(nodes) == len(books[name]) - 1
+        for length, code, value in books[name]:  # each codeword walks to its own leaf
+            entry = 0
+            for i in range(length - 1, -1, -1):
+                assert entry >= 0, (name, hex(code))
+                entry = nodes[entry][(code >> i) & 1]
+            assert entry + 64 == value, (name, hex(code))
         out.append(f'extern "C" constexpr int32_t {name}_OnlyParsing[{len(nodes)}][2] = {{')
         line = "   "
         for a, b in nodes:

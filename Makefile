@@ -1,7 +1,9 @@
 # vorcal: convenience targets over CMake.
-#   make run             install a compiler and CMake when missing, build the library, libvorsal, the
-#                        vorcal tool and the example engine, and run the tool on the bundled samples
-#   make test            install GoogleTest too when missing, build everything, run every CTest test
+#   make run             install a compiler and CMake when missing, build the library,
+#                        libvorsal, the vorcal tool and the example engine, and run the tool on
+#                        the bundled samples
+#   make test            install GoogleTest (and python3) too when missing, build everything, run
+#                        every CTest test
 #   make check-sanitize  the whole suite under AddressSanitizer and UndefinedBehaviorSanitizer
 #   make check-arm       cross-build for 32-bit ARM and run the suite under qemu-arm
 #   make fuzz            build the libFuzzer targets with clang and run each FUZZ_SECONDS seconds
@@ -64,8 +66,10 @@ check-sanitize:
 
 check-arm:
 	@command -v arm-linux-gnueabihf-g++ >/dev/null 2>&1 && command -v qemu-arm >/dev/null 2>&1 || \
-	  { $(SUDO) apt-get update && $(SUDO) apt-get install -y g++-arm-linux-gnueabihf qemu-user googletest; }
-	cmake -S . -B build-arm $(GENERATOR) $(CMAKE_FLAGS) -DCMAKE_TOOLCHAIN_FILE=cmake/arm-linux-gnueabihf.cmake \
+	  { $(SUDO) apt-get update && \
+	    $(SUDO) apt-get install -y g++-arm-linux-gnueabihf qemu-user googletest; }
+	cmake -S . -B build-arm $(GENERATOR) $(CMAKE_FLAGS) \
+	  -DCMAKE_TOOLCHAIN_FILE=cmake/arm-linux-gnueabihf.cmake \
 	  -DVORCAL_GTEST_FROM_SOURCE=ON -DVORCAL_BUILD_BENCH=OFF
 	cmake --build build-arm -j $(JOBS)
 	ctest --test-dir build-arm --output-on-failure -j $(JOBS)

@@ -1,5 +1,6 @@
-// The parse-only bit reader (ISO/IEC 14496-3 bit order: most significant bit first). It keeps
-// no end bound by design: the callers of the parse-only decoder pass buffers with slack.
+// The parse-only bit reader (ISO/IEC 14496-3 bit order: most significant bit first).
+// CONTRACT: it keeps no end bound; the callers of the parse-only decoder pass buffers with
+// slack.
 #include <vorcal/aacparse.h>
 
 #include "aacparse/reader.hpp"
@@ -62,22 +63,4 @@ extern "C" uint32_t VrGetProcessedBits_OnlyParsing(VrBitReader_OnlyParsing *pBit
 extern "C" int32_t VrByteAlign_OnlyParsing(VrBitReader_OnlyParsing *pBits)
 {
     return bits::ByteAlign(*pBits);
-}
-
-extern "C" uint32_t get_samplerate_idxOnlyParsing(uint32_t uSampleRate)
-{
-    switch (uSampleRate) {
-    case 96000: return 0;
-    case 88200: return 1;
-    case 64000: return 2;
-    case 48000: return 3;
-    case 32000: return 5;
-    case 24000: return 6;
-    case 22050: return 7;
-    case 16000: return 8;
-    case 12000: return 9;
-    case 11025: return 10;
-    case 8000: return 11;
-    default: return 4; // 44100 and every unknown rate
-    }
 }

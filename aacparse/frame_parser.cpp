@@ -22,12 +22,11 @@
 
 namespace {
 
-constexpr uint32_t kMaxFrame = 8191;       // aac_frame_length is 13 bits; longer access units are refused
+constexpr uint32_t kMaxFrame = 8191; // aac_frame_length is 13 bits; longer access units are refused
 constexpr uint32_t kSlack = 16384;         // zero bytes behind the frame (see above)
-constexpr uint32_t kSbrTail = 1024;        // zero bytes behind an SBR payload copy: an sbr_extension_data
-                                           // of one channel reads fewer than 7000 bits whatever its bits
+constexpr uint32_t kSbrTail = 1024; // zero bytes behind an SBR payload copy: an sbr_extension_data
+                                    // of one channel reads fewer than 7000 bits whatever its bits
 constexpr uint32_t kMaxPayload = 15 + 255 - 1; // bytes of one fill element's payloads
-constexpr uint32_t kSyncAdts = 0xFFF;
 
 } // namespace
 
@@ -119,7 +118,8 @@ void SbrPayload(void *pContext, VrAACDecoder_OnlyParsing &dec, uint32_t uCount)
     const uint32_t uBytes = (uEnd + 7) / 8;
     Place(p.aSbr, p.uSbrDirty, dec.Bits.pCurrent, uBytes);
     if (uEnd % 8)
-        p.aSbr[uBytes - 1] &= static_cast<uint8_t>(0xFF00u >> (uEnd % 8)); // the next element's bits
+        // Clears the next element's bits.
+        p.aSbr[uBytes - 1] &= static_cast<uint8_t>(0xFF00u >> (uEnd % 8));
     VrBitReader_OnlyParsing reader;
     VrInitBits_OnlyParsing(&reader, p.aSbr);
     bits::Advance(reader, uBitPos);
@@ -198,19 +198,20 @@ Result EndOfFrame(const Walk &w)
 
 // adts_frame(): header, the raw_data_block_position words of a protected frame with several
 // blocks, then each block and, in that case, its CRC word (ISO/IEC 13818-7 6.2).
-Result AdtsFrame(CALAACParser &p, const uint8_t *pFrame, uint32_t uLen, CALAACFrameInfo &info, Walk &w)
+Result AdtsFrame(CALAACParser &p, const uint8_t *pFrame, uint32_t uLen, CALAACFrameInfo &info,
+                 Walk &w)
 {
-    if (uLen < 2 || pFrame[0] != 0xFF || (pFrame[1] & 0xF0) != 0xF0)
+    if (uLen < 2 || !aac::IsAdtsSync(pFrame))
         return kBadInput;
     VrAACDecoder_OnlyParsing &dec = p.dec;
     const bool bCrc = (pFrame[1] & 1) == 0;
     const uint32_t uHeaderBytes = bCrc ? 9 : 7;
     Place(p.aFrame, p.uFrameDirty, pFrame, uLen < uHeaderBytes ? uLen : uHeaderBytes);
     VrInitBits_OnlyParsing(&dec.Bits, p.aFrame);
-    if (bits::Show(dec.Bits, 12) != kSyncAdts || AdtsHeader(dec) != 0)
+    if (AdtsHeader(dec) != 0)
         return kBadInput;
     const VrADTSHeader_OnlyParsing &h = dec.ADTS;
-    info.uSampleRate = RateOf(h.uSampleRateIdx);
+    info.uSampleRate = aac::RateOfIndex(h.uSampleRateIdx);
     info.uChannels = h.uChannelConfig;
     info.uFrameBytes = h.uFrameLength;
     if (uLen < uHeaderBytes || uLen < h.uFrameLength)
@@ -222,7 +223,8 @@ Result AdtsFrame(CALAACParser &p, const uint8_t *pFrame, uint32_t uLen, CALAACFr
     StartSbr(p, info.uSampleRate);
     const bool bBlockCrc = bCrc && h.uRawDataBlocks > 0;
     if (bBlockCrc)
-        bits::Advance(dec.Bits, 16 * h.uRawDataBlocks); // raw_data_block_position; the header read crc_check
+        // raw_data_block_position; the header read crc_check.
+        bits::Advance(dec.Bits, 16 * h.uRawDataBlocks);
     for (uint32_t i = 0; i <= h.uRawDataBlocks; ++i) {
         const Result r = RawDataBlock(w);
         if (r != kOk)
@@ -233,7 +235,8 @@ Result AdtsFrame(CALAACParser &p, const uint8_t *pFrame, uint32_t uLen, CALAACFr
     return EndOfFrame(w);
 }
 
-Result RawFrame(CALAACParser &p, const uint8_t *pFrame, uint32_t uLen, CALAACFrameInfo &info, Walk &w)
+Result RawFrame(CALAACParser &p, const uint8_t *pFrame, uint32_t uLen, CALAACFrameInfo &info,
+                Walk &w)
 {
     info.uFrameBytes = uLen;
     if (!p.bUsable || uLen > kMaxFrame)
@@ -268,16 +271,17 @@ bool AudioSpecificConfig(CALAACParser &p, const uint8_t *pASC, uint32_t uLen)
         uIndex = bits::Get(b, 4);
         if (uIndex == 15) {
             const uint32_t uRate = bits::Get(b, 24);
-            uIndex = get_samplerate_idxOnlyParsing(uRate);
-            return RateOf(uIndex) == uRate;
+            const int32_t iIndex = aac::IndexOfRate(uRate);
+            uIndex = iIndex < 0 ? get_samplerate_idxOnlyParsing(uRate) : uint32_t(iIndex);
+            return iIndex >= 0;
         }
-        return uIndex < 12;
+        return uIndex < aac::kSampleRates.size();
     };
     uint32_t uType = objectType(), uIndex = 0, uExtIndex = 0;
     if (!rateIndex(uIndex))
         return false;
     const uint32_t uConfig = bits::Get(b, 4);
-    p.uAscRate = RateOf(uIndex);
+    p.uAscRate = aac::RateOfIndex(uIndex);
     p.uAscChannels = uConfig;
     if (uType == 5 || uType == 29) {
         p.bExplicitSBR = true;
@@ -303,7 +307,8 @@ bool AudioSpecificConfig(CALAACParser &p, const uint8_t *pASC, uint32_t uLen)
     }
     if (uExtensionFlag)
         bits::Get1(b); // extensionFlag3
-    if (!p.bExplicitSBR && left() >= 16 && bits::Get(b, 11) == 0x2B7 && objectType() == 5 && bits::Get1(b)) {
+    if (!p.bExplicitSBR && left() >= 16 && bits::Get(b, 11) == 0x2B7 && objectType() == 5 &&
+        bits::Get1(b)) {
         p.bExplicitSBR = true;
         rateIndex(uExtIndex);
         if (left() >= 12 && bits::Get(b, 11) == 0x548)
@@ -369,8 +374,8 @@ extern "C" CALAACParser *vorCALTools_AAC_CreateParser(const uint8_t *pASC, int32
     return vorcal::aacparse::Create(pASC, iASCLen);
 }
 
-extern "C" int32_t vorCALTools_AAC_ParseFrame(CALAACParser *hParser, const uint8_t *pFrame, int32_t iLen,
-                                              CALAACFrameInfo *pInfo)
+extern "C" int32_t vorCALTools_AAC_ParseFrame(CALAACParser *hParser, const uint8_t *pFrame,
+                                              int32_t iLen, CALAACFrameInfo *pInfo)
 {
     return vorcal::aacparse::ParseFrame(hParser, pFrame, iLen, pInfo);
 }

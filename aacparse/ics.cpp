@@ -21,11 +21,12 @@ constexpr uint32_t kMaxSections = VR_AAC_MAX_SECTIONS_OnlyParsing;
 constexpr uint32_t kLines = VR_AAC_FRAME_LINES_OnlyParsing;
 // Codebook numbers (ISO/IEC 14496-3 Table 4.150) and the one the M/S mask turns a noise band
 // into when it repeats the first channel's noise.
-constexpr uint32_t kZeroBook = 0, kEscBook = 11, kReservedBook = 12, kNoiseBook = 13, kIntensityBook2 = 14,
-                   kIntensityBook = 15, kNoiseRepeatBook = 113;
+constexpr uint32_t kZeroBook = 0, kEscBook = 11, kReservedBook = 12, kNoiseBook = 13,
+                   kIntensityBook2 = 14, kIntensityBook = 15, kNoiseRepeatBook = 113;
 constexpr int32_t kNoiseOffset = 90; // NOISE_OFFSET of 4.6.13.3
 
-const VrWindowInfo_OnlyParsing *InfoOf(const VrAACDecoder_OnlyParsing &dec, const VrICS_OnlyParsing &ics)
+const VrWindowInfo_OnlyParsing *InfoOf(const VrAACDecoder_OnlyParsing &dec,
+                                       const VrICS_OnlyParsing &ics)
 {
     const VrWindowInfo_OnlyParsing *p = dec.pWindowInfo[ics.uWindowSequence & 3];
     return p && p->uBandsPerWindow ? p : nullptr;
@@ -45,7 +46,8 @@ uint32_t GroupCount(const VrICS_OnlyParsing &ics)
 // The codebook and band range of each section, group by group, band indices over the block
 // (group g, band k is g x bands per window + k).
 template <typename Visit>
-bool WalkSections(const VrICS_OnlyParsing &ics, const VrICS_OnlyParsing &wics, uint32_t uBandsPerWindow, Visit &&visit)
+bool WalkSections(const VrICS_OnlyParsing &ics, const VrICS_OnlyParsing &wics,
+                  uint32_t uBandsPerWindow, Visit &&visit)
 {
     const uint32_t uSections = ics.uSections < kMaxSections ? ics.uSections : kMaxSections;
     const uint32_t uGroups = GroupCount(wics);
@@ -54,7 +56,8 @@ bool WalkSections(const VrICS_OnlyParsing &ics, const VrICS_OnlyParsing &wics, u
         uint32_t k = g * uBandsPerWindow;
         const uint32_t uGroupEnd = k + wics.uMaxSfb;
         while (k < uGroupEnd && i < uSections) {
-            const uint32_t uEnd = ics.Section[i].uEndBand < kMaxBands ? ics.Section[i].uEndBand : kMaxBands;
+            const uint32_t uEnd =
+                ics.Section[i].uEndBand < kMaxBands ? ics.Section[i].uEndBand : kMaxBands;
             if (!visit(i, ics.Section[i].uCodebook, k, uEnd))
                 return false;
             ++i;
@@ -70,7 +73,8 @@ struct Cursor {
     VrBitReader_OnlyParsing &b;
     const uint8_t *p;
     uint32_t uBit, uStart;
-    explicit Cursor(VrBitReader_OnlyParsing &r) : b(r), p(r.pCurrent), uBit(r.uBitPos), uStart(r.uBitPos) {}
+    explicit Cursor(VrBitReader_OnlyParsing &r)
+        : b(r), p(r.pCurrent), uBit(r.uBitPos), uStart(r.uBitPos) {}
     // The next n bits, 1 <= n <= 25.
     uint32_t Peek(uint32_t n) const
     {
@@ -93,10 +97,12 @@ int32_t ScalefactorDiff(Cursor &c)
 {
     const uint32_t uPeek = c.Peek(19);
     // Level 0 directly (most differences have codes of up to 6 bits), else the level search.
-    const int32_t v = static_cast<int32_t>(uPeek >> 13) - static_cast<int32_t>(MaxVal_sclOnlyParsing[0]);
+    const int32_t v =
+        static_cast<int32_t>(uPeek >> 13) - static_cast<int32_t>(MaxVal_sclOnlyParsing[0]);
+    const int32_t i0 = static_cast<int32_t>(CBsize_sclOnlyParsing[0]) + v; // in level 0 if v <= 0
     const huffman::ScalefactorHit hit =
-        v <= 0 ? huffman::ScalefactorHit{bookscl0OnlyParsing[static_cast<int32_t>(CBsize_sclOnlyParsing[0]) + v],
-                                         huffman::kScalefactorLength0[static_cast<uint32_t>(static_cast<int32_t>(CBsize_sclOnlyParsing[0]) + v)]}
+        v <= 0 ? huffman::ScalefactorHit{bookscl0OnlyParsing[i0],
+                                         huffman::kScalefactorLength0[static_cast<uint32_t>(i0)]}
                : huffman::FindScalefactor(huffman::kScalefactor, uPeek);
     c.uBit += hit.uLength;
     return static_cast<int32_t>(hit.uIndex) - 60;
@@ -106,7 +112,8 @@ int32_t ScalefactorDiff(Cursor &c)
 int32_t EscapeOn(VrBitReader_OnlyParsing &b, int32_t iValue)
 {
     uint32_t n = 0;
-    while (Get1(b)) // escape_prefix; more than 8 ones is invalid but read as it comes
+    // CONTRACT: more than 8 ones of escape_prefix is invalid but read as it comes.
+    while (Get1(b))
         ++n;
     const uint32_t uWidth = n + 4;
     uint32_t uWord = 0;
@@ -142,12 +149,14 @@ void DecodeLines(VrAACDecoder_OnlyParsing &dec, int16_t *piOut, uint32_t uCount)
 #if defined(__BYTE_ORDER__) && __BYTE_ORDER__ == __ORDER_LITTLE_ENDIAN__
             uWord = __builtin_bswap32(uWord);
 #endif
-            const huffman::SpectralHit hit = huffman::FindSpectral(row, (uWord << (uBit & 7)) >> 16);
+            const huffman::SpectralHit hit =
+                huffman::FindSpectral(row, (uWord << (uBit & 7)) >> 16);
             uBit += hit.uLength;
             if constexpr (!kSigned) { // a sign bit for each nonzero byte of the entry
                 uint32_t uQuad;
                 std::memcpy(&uQuad, hit.pEntry->iValue, 4);
-                const uint32_t uNonzero = ((((uQuad & 0x7F7F7F7Fu) + 0x7F7F7F7Fu) | uQuad) & 0x80808080u) >> 7;
+                const uint32_t uNonzero =
+                    ((((uQuad & 0x7F7F7F7Fu) + 0x7F7F7F7Fu) | uQuad) & 0x80808080u) >> 7;
                 uBit += (uNonzero * 0x01010101u) >> 24; // the byte sum
             }
             if constexpr (kBook == kEscBook) {
@@ -198,9 +207,10 @@ void DecodeSection(VrAACDecoder_OnlyParsing &dec, uint32_t uBook, int16_t *piOut
     using Decode = void (*)(VrAACDecoder_OnlyParsing &, int16_t *, uint32_t);
     static constexpr Decode kDecode[12] = {
         nullptr,
-        DecodeLines<1, kStore>, DecodeLines<2, kStore>, DecodeLines<3, kStore>, DecodeLines<4, kStore>,
-        DecodeLines<5, kStore>, DecodeLines<6, kStore>, DecodeLines<7, kStore>, DecodeLines<8, kStore>,
-        DecodeLines<9, kStore>, DecodeLines<10, kStore>, DecodeLines<11, kStore>,
+        DecodeLines<1, kStore>,  DecodeLines<2, kStore>,  DecodeLines<3, kStore>,
+        DecodeLines<4, kStore>,  DecodeLines<5, kStore>,  DecodeLines<6, kStore>,
+        DecodeLines<7, kStore>,  DecodeLines<8, kStore>,  DecodeLines<9, kStore>,
+        DecodeLines<10, kStore>, DecodeLines<11, kStore>,
     };
     kDecode[uBook](dec, piOut, uCount);
 }
@@ -214,7 +224,9 @@ void ExpandGroups(VrAACDecoder_OnlyParsing &dec, const VrICS_OnlyParsing &wics)
     const uint32_t uGroups = GroupCount(wics);
     uint32_t uStart = 0;
     for (uint32_t g = 0; g < uGroups; ++g) {
-        const uint32_t uEnd = wics.uGroupEnds[g] > uStart && wics.uGroupEnds[g] <= 8 ? wics.uGroupEnds[g] : uStart + 1;
+        const uint32_t uEnd = wics.uGroupEnds[g] > uStart && wics.uGroupEnds[g] <= 8
+                                  ? wics.uGroupEnds[g]
+                                  : uStart + 1;
         const uint32_t uLen = uEnd - uStart;
         info.uGroupLengths[g] = static_cast<uint16_t>(uLen);
         info.uGroupOffsets[g] = 128 * uStart;
@@ -241,7 +253,8 @@ uint32_t IcsInfo(VrAACDecoder_OnlyParsing &dec, VrICS_OnlyParsing &ics)
     std::memset(ics.uGroupEnds, 0, sizeof ics.uGroupEnds);
     if (ics.uWindowSequence == kEightShort) {
         ics.uMaxSfb = Get(b, 4);
-        const uint32_t uGrouping = Get(b, 7); // scale_factor_grouping: 1 joins a window to its predecessor
+        // scale_factor_grouping: 1 joins a window to its predecessor
+        const uint32_t uGrouping = Get(b, 7);
         uint32_t g = 0;
         for (uint32_t w = 1; w < 8; ++w)
             if (((uGrouping >> (7 - w)) & 1) == 0)
@@ -255,14 +268,17 @@ uint32_t IcsInfo(VrAACDecoder_OnlyParsing &dec, VrICS_OnlyParsing &ics)
     if (dec.MCInfo.uProfile != 3 && Get1(b)) {
         if (Get1(b))     // predictor_reset
             Get(b, 5);   // predictor_reset_group_number
-        const uint32_t uPredBands = VrTBL_pred_max_bands_OnlyParsing[dec.MCInfo.uSampleRateIdx < 12 ? dec.MCInfo.uSampleRateIdx : 0];
-        const uint32_t uBands = dec.MCInfo.uSampleRateIdx < 12 ? (ics.uMaxSfb < uPredBands ? ics.uMaxSfb : uPredBands) : 0;
+        const uint32_t uIndex = dec.MCInfo.uSampleRateIdx;
+        const uint32_t uPredBands = VrTBL_pred_max_bands_OnlyParsing[uIndex < 12 ? uIndex : 0];
+        const uint32_t uBands =
+            uIndex < 12 ? (ics.uMaxSfb < uPredBands ? ics.uMaxSfb : uPredBands) : 0;
         bits::Advance(b, uBands); // prediction_used
     }
     return 1;
 }
 
-void SectionData(VrAACDecoder_OnlyParsing &dec, VrICS_OnlyParsing &ics, const VrICS_OnlyParsing &wics)
+void SectionData(VrAACDecoder_OnlyParsing &dec, VrICS_OnlyParsing &ics,
+                 const VrICS_OnlyParsing &wics)
 {
     VrBitReader_OnlyParsing &b = dec.Bits;
     std::memset(ics.uBandCodebook, kZeroBook, sizeof ics.uBandCodebook);
@@ -270,7 +286,8 @@ void SectionData(VrAACDecoder_OnlyParsing &dec, VrICS_OnlyParsing &ics, const Vr
     const VrWindowInfo_OnlyParsing *pInfo = InfoOf(dec, wics);
     if (!pInfo || wics.uMaxSfb > pInfo->uBandsPerWindow || pInfo->uBandsPerWindow > kMaxBands)
         return;
-    const uint32_t nb = pInfo->uBandsPerWindow, uBits = pInfo->uSectionBits, uEsc = (1u << uBits) - 1;
+    const uint32_t nb = pInfo->uBandsPerWindow, uBits = pInfo->uSectionBits,
+                   uEsc = (1u << uBits) - 1;
     const uint32_t uGroups = GroupCount(wics);
     uint32_t n = 0;
     for (uint32_t g = 0; g < uGroups; ++g) {
@@ -295,8 +312,8 @@ void SectionData(VrAACDecoder_OnlyParsing &dec, VrICS_OnlyParsing &ics, const Vr
     ics.uSections = n;
 }
 
-uint32_t ScaleFactorData(VrAACDecoder_OnlyParsing &dec, VrICS_OnlyParsing &ics, const VrICS_OnlyParsing &wics,
-                         uint32_t uChannel, uint32_t uGlobalGain)
+uint32_t ScaleFactorData(VrAACDecoder_OnlyParsing &dec, VrICS_OnlyParsing &ics,
+                         const VrICS_OnlyParsing &wics, uint32_t uChannel, uint32_t uGlobalGain)
 {
     if (ics.uSections == 0)
         return 1;
@@ -310,7 +327,7 @@ uint32_t ScaleFactorData(VrAACDecoder_OnlyParsing &dec, VrICS_OnlyParsing &ics, 
     int32_t iNoise = static_cast<int32_t>(uGlobalGain) - kNoiseOffset;
     bool bFirstNoise = true;
     Cursor c(b);
-    const bool bDone = WalkSections(ics, wics, pInfo->uBandsPerWindow, [&](uint32_t i, uint32_t uBook, uint32_t uFirst, uint32_t uEnd) {
+    auto read = [&](uint32_t i, uint32_t uBook, uint32_t uFirst, uint32_t uEnd) {
         switch (uBook) {
         case kZeroBook:
             for (uint32_t band = uFirst; band < uEnd; ++band)
@@ -353,13 +370,15 @@ uint32_t ScaleFactorData(VrAACDecoder_OnlyParsing &dec, VrICS_OnlyParsing &ics, 
             }
             return true;
         }
-    });
+    };
+    const bool bDone = WalkSections(ics, wics, pInfo->uBandsPerWindow, read);
     c.Sync();
     return bDone ? 1 : 0;
 }
 
-uint32_t SpectralData(VrAACDecoder_OnlyParsing &dec, VrICS_OnlyParsing &ics, const VrICS_OnlyParsing &wics,
-                      uint32_t uChannel, uint32_t uFirstChannel, bool bValues)
+uint32_t SpectralData(VrAACDecoder_OnlyParsing &dec, VrICS_OnlyParsing &ics,
+                      const VrICS_OnlyParsing &wics, uint32_t uChannel, uint32_t uFirstChannel,
+                      bool bValues)
 {
     const VrWindowInfo_OnlyParsing *pInfo = InfoOf(dec, wics);
     if (!pInfo || uChannel >= VR_AAC_CHANNELS_OnlyParsing)
@@ -367,9 +386,10 @@ uint32_t SpectralData(VrAACDecoder_OnlyParsing &dec, VrICS_OnlyParsing &ics, con
     const uint32_t uFirst = uFirstChannel < VR_AAC_CHANNELS_OnlyParsing ? uFirstChannel : uChannel;
     int16_t *piLines = dec.iSpectrum[uChannel];
     const uint16_t *puTops = pInfo->uBlockBandTops;
-    WalkSections(ics, wics, pInfo->uBandsPerWindow, [&](uint32_t, uint32_t uBook, uint32_t uBand, uint32_t uEnd) {
-        if (uEnd <= uBand || uBook == kZeroBook || uBook == kIntensityBook || uBook == kIntensityBook2 ||
-            uBook == kReservedBook || (uBook > kIntensityBook && uBook != kNoiseRepeatBook))
+    auto read = [&](uint32_t, uint32_t uBook, uint32_t uBand, uint32_t uEnd) {
+        if (uEnd <= uBand || uBook == kZeroBook || uBook == kIntensityBook ||
+            uBook == kIntensityBook2 || uBook == kReservedBook ||
+            (uBook > kIntensityBook && uBook != kNoiseRepeatBook))
             return true; // an empty section, or one without spectral data
         const uint32_t uLo = uBand == 0 ? 0 : puTops[uBand - 1];
         const uint32_t uHi = puTops[uEnd - 1] < kLines ? puTops[uEnd - 1] : kLines;
@@ -385,7 +405,8 @@ uint32_t SpectralData(VrAACDecoder_OnlyParsing &dec, VrICS_OnlyParsing &ics, con
         if (!bValues)
             return true; // noise bands carry no spectral bits
         for (uint32_t band = uBand; band < uEnd; ++band) {
-            const uint32_t lo = band == 0 ? 0 : puTops[band - 1], hi = puTops[band] < kLines ? puTops[band] : kLines;
+            const uint32_t lo = band == 0 ? 0 : puTops[band - 1];
+            const uint32_t hi = puTops[band] < kLines ? puTops[band] : kLines;
             if (hi <= lo)
                 continue;
             int16_t iExponent = 0;
@@ -399,7 +420,8 @@ uint32_t SpectralData(VrAACDecoder_OnlyParsing &dec, VrICS_OnlyParsing &ics, con
             dec.iBandExponents[uChannel][band] = iExponent;
         }
         return true;
-    });
+    };
+    WalkSections(ics, wics, pInfo->uBandsPerWindow, read);
     if (dec.uPulsePresent && bValues)
         ApplyPulses(dec, uChannel, dec.Pulse);
     return 1;
@@ -419,7 +441,8 @@ uint32_t MsMask(VrAACDecoder_OnlyParsing &dec, const VrICS_OnlyParsing &ics)
     const uint32_t nb = pInfo->uBandsPerWindow, uGroups = GroupCount(ics);
     for (uint32_t g = 0; g < uGroups; ++g)
         for (uint32_t k = 0; k < nb && g * nb + k < kMaxBands; ++k)
-            dec.uMSMask[g * nb + k] = static_cast<uint8_t>(uPresent == 2 ? 1 : k < ics.uMaxSfb ? Get1(dec.Bits) : 0);
+            dec.uMSMask[g * nb + k] =
+                static_cast<uint8_t>(uPresent == 2 ? 1 : k < ics.uMaxSfb ? Get1(dec.Bits) : 0);
     return uPresent;
 }
 
@@ -437,23 +460,27 @@ uint32_t PulseData(VrAACDecoder_OnlyParsing &dec, VrPulseInfo_OnlyParsing &pulse
     return uLast;
 }
 
-void ApplyPulses(VrAACDecoder_OnlyParsing &dec, uint32_t uChannel, const VrPulseInfo_OnlyParsing &pulse)
+void ApplyPulses(VrAACDecoder_OnlyParsing &dec, uint32_t uChannel,
+                 const VrPulseInfo_OnlyParsing &pulse)
 {
     const VrWindowInfo_OnlyParsing &info = dec.LongInfo;
     if (uChannel >= VR_AAC_CHANNELS_OnlyParsing || !info.puBandTops)
         return;
-    const uint32_t uSfb = pulse.uStartSfb < info.uBandsPerWindow ? pulse.uStartSfb : info.uBandsPerWindow;
+    const uint32_t uSfb =
+        pulse.uStartSfb < info.uBandsPerWindow ? pulse.uStartSfb : info.uBandsPerWindow;
     uint32_t k = uSfb == 0 ? 0 : info.puBandTops[uSfb - 1];
     for (uint32_t i = 0; i <= pulse.uPulses && i < VR_AAC_MAX_PULSES_OnlyParsing; ++i) {
         k += pulse.uOffset[i];
         if (k >= kLines)
             return;
         int16_t &v = dec.iSpectrum[uChannel][k];
-        v = static_cast<int16_t>(v > 0 ? v + static_cast<int32_t>(pulse.uAmp[i]) : v - static_cast<int32_t>(pulse.uAmp[i]));
+        const auto iAmp = static_cast<int32_t>(pulse.uAmp[i]);
+        v = static_cast<int16_t>(v > 0 ? v + iAmp : v - iAmp);
     }
 }
 
-void TnsData(VrAACDecoder_OnlyParsing &dec, const VrICS_OnlyParsing &ics, VrTNSInfo_OnlyParsing &tns)
+void TnsData(VrAACDecoder_OnlyParsing &dec, const VrICS_OnlyParsing &ics,
+             VrTNSInfo_OnlyParsing &tns)
 {
     VrBitReader_OnlyParsing &b = dec.Bits;
     const bool bShort = ics.uWindowSequence == kEightShort;
@@ -474,7 +501,9 @@ void TnsData(VrAACDecoder_OnlyParsing &dec, const VrICS_OnlyParsing &ics, VrTNSI
             const uint32_t uBits = win.uCoefRes + 3 - flt.uCoefCompress; // 2 to 4
             for (uint32_t j = 0; j < flt.uOrder; ++j) {
                 const uint32_t c = Get(b, uBits);
-                flt.iCoef[j] = static_cast<int16_t>(c & sgn_maskOnlyParsing[uBits - 2] ? c | neg_maskOnlyParsing[uBits - 2] : c);
+                const bool bNegative = (c & sgn_maskOnlyParsing[uBits - 2]) != 0;
+                flt.iCoef[j] =
+                    static_cast<int16_t>(bNegative ? c | neg_maskOnlyParsing[uBits - 2] : c);
             }
         }
     }
@@ -488,15 +517,17 @@ void ClearTns(VrTNSInfo_OnlyParsing &tns)
         win.uFilters = 0;
 }
 
-uint32_t Ics(VrAACDecoder_OnlyParsing &dec, VrICS_OnlyParsing &ics, uint32_t uCommonWindow, uint32_t uChannel,
-             uint32_t uFirstChannel, uint32_t uWindowInfoChannel, bool bValues)
+uint32_t Ics(VrAACDecoder_OnlyParsing &dec, VrICS_OnlyParsing &ics, uint32_t uCommonWindow,
+             uint32_t uChannel, uint32_t uFirstChannel, uint32_t uWindowInfoChannel, bool bValues)
 {
     if (uChannel >= VR_AAC_CHANNELS_OnlyParsing)
         return 0;
     VrBitReader_OnlyParsing &b = dec.Bits;
     // With common_window the ics_info is that of the window-info channel, else the stream's own.
     const VrICS_OnlyParsing &wics =
-        uCommonWindow && uWindowInfoChannel < VR_AAC_CHANNELS_OnlyParsing ? dec.ICS[uWindowInfoChannel] : ics;
+        uCommonWindow && uWindowInfoChannel < VR_AAC_CHANNELS_OnlyParsing
+            ? dec.ICS[uWindowInfoChannel]
+            : ics;
     const uint32_t uGlobalGain = Get(b, 8);
     if (!uCommonWindow && !IcsInfo(dec, ics))
         return 0;
@@ -529,61 +560,69 @@ using namespace vorcal::aacparse;
 
 namespace {
 
-const VrICS_OnlyParsing &WindowIcs(const VrAACDecoder_OnlyParsing *pDec, const VrICS_OnlyParsing *pICS, uint32_t uChannel)
+const VrICS_OnlyParsing &WindowIcs(const VrAACDecoder_OnlyParsing *pDec,
+                                   const VrICS_OnlyParsing *pICS, uint32_t uChannel)
 {
     return uChannel < VR_AAC_CHANNELS_OnlyParsing ? pDec->ICS[uChannel] : *pICS;
 }
 
 } // namespace
 
-extern "C" uint32_t geticsOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrICS_OnlyParsing *pICS, uint32_t uCommonWindow,
-                                      uint32_t uChannel, uint32_t uFirstChannel, uint32_t uWindowInfoChannel)
+extern "C" uint32_t geticsOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrICS_OnlyParsing *pICS,
+                                      uint32_t uCommonWindow, uint32_t uChannel,
+                                      uint32_t uFirstChannel, uint32_t uWindowInfoChannel)
 {
     return Ics(*pDec, *pICS, uCommonWindow, uChannel, uFirstChannel, uWindowInfoChannel);
 }
 
-extern "C" uint32_t get_ics_infoOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrICS_OnlyParsing *pICS, uint32_t,
-                                            uint32_t, uint32_t)
+extern "C" uint32_t get_ics_infoOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrICS_OnlyParsing *pICS,
+                                            uint32_t, uint32_t, uint32_t)
 {
     return IcsInfo(*pDec, *pICS);
 }
 
-extern "C" uint32_t section_dataOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrICS_OnlyParsing *pICS, uint32_t,
-                                            uint32_t uWindowInfoChannel)
+extern "C" uint32_t section_dataOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrICS_OnlyParsing *pICS,
+                                            uint32_t, uint32_t uWindowInfoChannel)
 {
     SectionData(*pDec, *pICS, WindowIcs(pDec, pICS, uWindowInfoChannel));
     return 0;
 }
 
-extern "C" uint32_t scale_factor_dataOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrICS_OnlyParsing *pICS,
-                                                 uint32_t uChannel, uint32_t uGlobalGain)
+extern "C" uint32_t scale_factor_dataOnlyParsing(VrAACDecoder_OnlyParsing *pDec,
+                                                 VrICS_OnlyParsing *pICS, uint32_t uChannel,
+                                                 uint32_t uGlobalGain)
 {
     return ScaleFactorData(*pDec, *pICS, *pICS, uChannel, uGlobalGain);
 }
 
-extern "C" uint32_t spectral_dataOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrICS_OnlyParsing *pICS, uint32_t uChannel,
+extern "C" uint32_t spectral_dataOnlyParsing(VrAACDecoder_OnlyParsing *pDec,
+                                             VrICS_OnlyParsing *pICS, uint32_t uChannel,
                                              uint32_t uFirstChannel)
 {
     return SpectralData(*pDec, *pICS, *pICS, uChannel, uFirstChannel);
 }
 
-extern "C" uint32_t getmaskOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrICS_OnlyParsing *pICS, uint32_t)
+extern "C" uint32_t getmaskOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrICS_OnlyParsing *pICS,
+                                       uint32_t)
 {
     return MsMask(*pDec, *pICS);
 }
 
-extern "C" uint32_t get_pulse_ncOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrPulseInfo_OnlyParsing *pPulse)
+extern "C" uint32_t get_pulse_ncOnlyParsing(VrAACDecoder_OnlyParsing *pDec,
+                                            VrPulseInfo_OnlyParsing *pPulse)
 {
     return PulseData(*pDec, *pPulse);
 }
 
-extern "C" uint32_t pulse_ncOnlyParsing(VrAACDecoder_OnlyParsing *pDec, uint32_t uChannel, const VrPulseInfo_OnlyParsing *pPulse)
+extern "C" uint32_t pulse_ncOnlyParsing(VrAACDecoder_OnlyParsing *pDec, uint32_t uChannel,
+                                        const VrPulseInfo_OnlyParsing *pPulse)
 {
     ApplyPulses(*pDec, uChannel, *pPulse);
     return 0;
 }
 
-extern "C" uint32_t get_tnsOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrICS_OnlyParsing *pICS, VrTNSInfo_OnlyParsing *pTNS)
+extern "C" uint32_t get_tnsOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrICS_OnlyParsing *pICS,
+                                       VrTNSInfo_OnlyParsing *pTNS)
 {
     TnsData(*pDec, *pICS, *pTNS);
     return 1;

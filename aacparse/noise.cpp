@@ -10,7 +10,7 @@ namespace {
 constexpr int16_t kNoExponent = -100;
 
 // -15 minus the left shifts that bring the magnitude (the complement of a negative sample) to
-// at least 16384. A zero sample counts -15 and a sample of -1 (complement 0) counts -30.
+// at least 16384. CONTRACT: a zero sample counts -15 and a sample of -1 (complement 0) -30.
 int32_t SampleExponent(int16_t iSample)
 {
     if (iSample == 0)
@@ -60,7 +60,8 @@ void RandVector(int16_t *piVector, int16_t &iExponent, int32_t iLength, int32_t 
 
 } // namespace vorcal::aacparse
 
-extern "C" void gen_rand_vectorOnlyParsing(int16_t *piVector, int16_t *piExponent, int32_t iLength, int32_t *piSeed)
+extern "C" void gen_rand_vectorOnlyParsing(int16_t *piVector, int16_t *piExponent, int32_t iLength,
+                                           int32_t *piSeed)
 {
     vorcal::aacparse::RandVector(piVector, *piExponent, iLength, *piSeed);
 }

@@ -9,7 +9,8 @@
 extern "C" constexpr uint8_t sgn_maskOnlyParsing[3] = {0x2, 0x4, 0x8};
 extern "C" constexpr uint16_t neg_maskOnlyParsing[3] = {0xFFFC, 0xFFF8, 0xFFF0};
 // pred_max_bands per sampling_frequency_index: the bands main profile prediction may cover.
-extern "C" constexpr uint32_t VrTBL_pred_max_bands_OnlyParsing[12] = {33, 33, 38, 40, 40, 40, 41, 41, 37, 37, 37, 34};
+extern "C" constexpr uint32_t VrTBL_pred_max_bands_OnlyParsing[12] = {33, 33, 38, 40, 40, 40,
+                                                                      41, 41, 37, 37, 37, 34};
 
 namespace vorcal::aacparse {
 namespace {
@@ -53,7 +54,8 @@ int32_t SingleChannel(VrAACDecoder_OnlyParsing &dec, VrMCInfo_OnlyParsing &map, 
 
 } // namespace
 
-uint32_t SingleChannelElement(VrAACDecoder_OnlyParsing &dec, VrMCInfo_OnlyParsing &map, bool bValues)
+uint32_t SingleChannelElement(VrAACDecoder_OnlyParsing &dec, VrMCInfo_OnlyParsing &map,
+                              bool bValues)
 {
     const int32_t ch = SingleChannel(dec, map, bValues);
     return ch >= 0 ? 0 : ch == -1 ? 3 : 4;
@@ -102,7 +104,8 @@ uint32_t ChannelPairElement(VrAACDecoder_OnlyParsing &dec, VrMCInfo_OnlyParsing 
     return 0;
 }
 
-uint32_t FillElement(VrAACDecoder_OnlyParsing &dec, uint8_t *pBuffer, PayloadHook hook, void *pContext)
+uint32_t FillElement(VrAACDecoder_OnlyParsing &dec, uint8_t *pBuffer, PayloadHook hook,
+                     void *pContext)
 {
     uint32_t uCount = Get(dec.Bits, 4);
     if (uCount == 15)
@@ -121,7 +124,8 @@ uint32_t ExtensionPayload(VrAACDecoder_OnlyParsing &dec, uint32_t uCount, uint8_
 {
     VrBitReader_OnlyParsing &b = dec.Bits;
     const uint32_t uBytes = uCount ? uCount - 1 : 0;
-    if (Get(b, 4) != kExtFillData) { // every other type, SBR data included, is stepped over
+    // CONTRACT: every other type, SBR data included, is stepped over unread.
+    if (Get(b, 4) != kExtFillData) {
         bits::Advance(b, 4 + 8 * uBytes);
         return uCount;
     }
@@ -134,7 +138,8 @@ uint32_t ExtensionPayload(VrAACDecoder_OnlyParsing &dec, uint32_t uCount, uint8_
     return uCount;
 }
 
-uint32_t DataStreamElement(VrAACDecoder_OnlyParsing &dec, uint32_t &uTag, uint32_t &uCount, uint8_t *pBuffer)
+uint32_t DataStreamElement(VrAACDecoder_OnlyParsing &dec, uint32_t &uTag, uint32_t &uCount,
+                           uint8_t *pBuffer)
 {
     VrBitReader_OnlyParsing &b = dec.Bits;
     uTag = Get(b, 4);
@@ -156,17 +161,20 @@ uint32_t DataStreamElement(VrAACDecoder_OnlyParsing &dec, uint32_t &uTag, uint32
 
 using namespace vorcal::aacparse;
 
-extern "C" uint32_t single_channel_elementOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrMCInfo_OnlyParsing *pMap)
+extern "C" uint32_t single_channel_elementOnlyParsing(VrAACDecoder_OnlyParsing *pDec,
+                                                      VrMCInfo_OnlyParsing *pMap)
 {
     return SingleChannelElement(*pDec, *pMap);
 }
 
-extern "C" uint32_t channel_pair_elementOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrMCInfo_OnlyParsing *pMap)
+extern "C" uint32_t channel_pair_elementOnlyParsing(VrAACDecoder_OnlyParsing *pDec,
+                                                    VrMCInfo_OnlyParsing *pMap)
 {
     return ChannelPairElement(*pDec, *pMap);
 }
 
-extern "C" uint32_t lfe_channel_elementOnlyParsing(VrAACDecoder_OnlyParsing *pDec, VrMCInfo_OnlyParsing *pMap)
+extern "C" uint32_t lfe_channel_elementOnlyParsing(VrAACDecoder_OnlyParsing *pDec,
+                                                   VrMCInfo_OnlyParsing *pMap)
 {
     return LfeChannelElement(*pDec, *pMap);
 }
@@ -176,12 +184,14 @@ extern "C" uint32_t getfillOnlyParsing(VrAACDecoder_OnlyParsing *pDec, uint8_t *
     return FillElement(*pDec, pBuffer);
 }
 
-extern "C" uint32_t extension_payloadOnlyParsing(VrAACDecoder_OnlyParsing *pDec, uint32_t uCount, uint8_t *pBuffer)
+extern "C" uint32_t extension_payloadOnlyParsing(VrAACDecoder_OnlyParsing *pDec, uint32_t uCount,
+                                                 uint8_t *pBuffer)
 {
     return ExtensionPayload(*pDec, uCount, pBuffer);
 }
 
-extern "C" uint32_t getdataOnlyParsing(VrAACDecoder_OnlyParsing *pDec, uint32_t *puTag, uint32_t *puCount, uint8_t *pBuffer)
+extern "C" uint32_t getdataOnlyParsing(VrAACDecoder_OnlyParsing *pDec, uint32_t *puTag,
+                                       uint32_t *puCount, uint8_t *pBuffer)
 {
     uint32_t uTag = 0, uCount = 0;
     const uint32_t uLast = DataStreamElement(*pDec, uTag, uCount, pBuffer);

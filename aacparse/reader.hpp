@@ -28,12 +28,13 @@ inline void Advance(VrBitReader_OnlyParsing &b, uint32_t n) noexcept
     b.uProcessedBits += n;
 }
 
-// The next n bits from the big-endian word at the current byte; 0 when the shift count
-// 32 - p - n leaves 0..31 (n = 0 at position 0, or n beyond the word).
+// The next n bits from the big-endian word at the current byte. CONTRACT: 0 when the shift
+// count 32 - p - n leaves 0..31 (n = 0 at position 0, or n beyond the word).
 inline uint32_t Show(const VrBitReader_OnlyParsing &b, uint32_t n) noexcept
 {
     const uint8_t *p = b.pCurrent;
-    const uint32_t uWord = (uint32_t{p[0]} << 24) | (uint32_t{p[1]} << 16) | (uint32_t{p[2]} << 8) | p[3];
+    const uint32_t uWord =
+        (uint32_t{p[0]} << 24) | (uint32_t{p[1]} << 16) | (uint32_t{p[2]} << 8) | p[3];
     const uint32_t uKept = uWord & kMask[32 - b.uBitPos];
     const int64_t iShift = int64_t{32} - b.uBitPos - n;
     return (iShift < 0 || iShift > 31) ? 0u : uKept >> iShift;
@@ -69,7 +70,8 @@ inline uint32_t GetShort(VrBitReader_OnlyParsing &b, uint32_t n) noexcept
 inline uint32_t GetFast(VrBitReader_OnlyParsing &b, uint32_t n) noexcept
 {
     const uint32_t p = b.uBitPos;
-    const uint32_t uEight = ((uint32_t{b.pCurrent[0]} << p) & 0xFF) | ((uint32_t{b.pCurrent[1]} << p) >> 8);
+    const uint32_t uEight =
+        ((uint32_t{b.pCurrent[0]} << p) & 0xFF) | ((uint32_t{b.pCurrent[1]} << p) >> 8);
     const uint32_t uValue = n < 32 ? (uEight << n) >> 8 : 0u;
     Advance(b, n);
     return uValue;

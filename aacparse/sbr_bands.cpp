@@ -14,17 +14,6 @@ constexpr int32_t kMaxBands = VR_SBR_MAX_BANDS;
 constexpr int32_t kTwoRegionRatioQ15 = 73561; // k2 / k0 >= 2.2449 splits at k1 = 2 k0
 constexpr int32_t kWarpQ14[2] = {16384, 21299}; // 1.0 and 1.3 for bs_alter_scale 0, 1
 
-void SortAscending(int32_t *v, int32_t n)
-{
-    for (int32_t i = 1; i < n; ++i) {
-        const int32_t x = v[i];
-        int32_t j = i;
-        for (; j > 0 && v[j - 1] > x; --j)
-            v[j] = v[j - 1];
-        v[j] = x;
-    }
-}
-
 // Band widths of a logarithmic region kLo..kHi in n bands:
 // round(kLo (kHi/kLo)^((k+1)/n)) - round(kLo (kHi/kLo)^(k/n)).
 void LogWidths(int32_t kLo, int32_t kHi, int32_t n, int32_t *width)
@@ -48,7 +37,8 @@ int32_t RegionBands(int32_t bands, int32_t kLo, int32_t kHi, int32_t warpQ14)
 }
 
 // The master table into master[0..return]; -1 when it cannot be built within 64 bands.
-int32_t MasterTable(int32_t k0, int32_t k2, uint32_t uFreqScale, uint32_t uAlterScale, int32_t *master)
+int32_t MasterTable(int32_t k0, int32_t k2, uint32_t uFreqScale, uint32_t uAlterScale,
+                    int32_t *master)
 {
     int32_t width[2 * kMaxBands];
     int32_t numBands = 0;
@@ -62,7 +52,8 @@ int32_t MasterTable(int32_t k0, int32_t k2, uint32_t uFreqScale, uint32_t uAlter
             width[k] = dk;
         int32_t k2Diff = k2 - (k0 + numBands * dk);
         const int32_t incr = k2Diff > 0 ? -1 : 1;
-        for (int32_t k = k2Diff > 0 ? numBands - 1 : 0; k2Diff != 0 && k >= 0 && k < numBands; k += incr) {
+        for (int32_t k = k2Diff > 0 ? numBands - 1 : 0; k2Diff != 0 && k >= 0 && k < numBands;
+             k += incr) {
             width[k] -= incr;
             k2Diff += incr;
         }

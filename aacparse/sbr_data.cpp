@@ -17,8 +17,14 @@ constexpr int32_t kNumTimeSlots = 16; // SBR time slots of a 1024-sample frame
 constexpr uint32_t kExtensionSbrCrc = 14;
 constexpr uint32_t kExtensionIdPs = 2;
 
-uint32_t Bits(VrBitReader_OnlyParsing *pBits, uint32_t n) { return VrGetBits_OnlyParsing(pBits, n); }
-uint8_t Byte(VrBitReader_OnlyParsing *pBits, uint32_t n) { return static_cast<uint8_t>(VrGetBits_OnlyParsing(pBits, n)); }
+uint32_t Bits(VrBitReader_OnlyParsing *pBits, uint32_t n)
+{
+    return VrGetBits_OnlyParsing(pBits, n);
+}
+uint8_t Byte(VrBitReader_OnlyParsing *pBits, uint32_t n)
+{
+    return static_cast<uint8_t>(VrGetBits_OnlyParsing(pBits, n));
+}
 
 // Walks a decoding tree one bit at a time; the trees are complete, so every path ends in a leaf.
 int32_t Huffman(VrBitReader_OnlyParsing *pBits, const int32_t (*tree)[2])
@@ -65,11 +71,14 @@ void ParseGrid(VrBitReader_OnlyParsing *pBits, VrSBRState_OnlyParsing *pSbr, uin
             rel[i] = 2 * static_cast<int32_t>(Bits(pBits, 2)) + 2;
     };
     auto limited = [](int32_t n) { return n > VR_SBR_MAX_ENVELOPES ? VR_SBR_MAX_ENVELOPES : n; };
-    auto pointer = [pBits](int32_t n) { return Byte(pBits, static_cast<uint32_t>(Log2_ceil(n + 1))); };
+    auto pointer = [pBits](int32_t n) {
+        return Byte(pBits, static_cast<uint32_t>(Log2_ceil(n + 1)));
+    };
 
     switch (uClass) {
     case kFixFix:
-        numEnv = limited(1 << Bits(pBits, 2)); // a code of 3 gives 5 envelopes, not 8
+        // CONTRACT: a code of 3 gives 5 envelopes, not 8.
+        numEnv = limited(1 << Bits(pBits, 2));
         pSbr->uPointer = 0;
         pSbr->uFreqRes[0] = Byte(pBits, 1);
         for (int32_t e = 1; e < numEnv; ++e)
@@ -165,8 +174,10 @@ void ParseEnvelopes(VrBitReader_OnlyParsing *pBits, VrSBRState_OnlyParsing *pSbr
 {
     // FIXFIX frames with one envelope always use 1.5 dB steps.
     const bool fine = (pSbr->uFrameClass == kFixFix && pSbr->uNumEnv == 1) || pSbr->uAmpRes == 0;
-    const int32_t (*timeTree)[2] = fine ? t_huffman_env_1_5dB_OnlyParsing : t_huffman_env_3_0dB_OnlyParsing;
-    const int32_t (*freqTree)[2] = fine ? f_huffman_env_1_5dB_OnlyParsing : f_huffman_env_3_0dB_OnlyParsing;
+    const int32_t (*timeTree)[2] =
+        fine ? t_huffman_env_1_5dB_OnlyParsing : t_huffman_env_3_0dB_OnlyParsing;
+    const int32_t (*freqTree)[2] =
+        fine ? f_huffman_env_1_5dB_OnlyParsing : f_huffman_env_3_0dB_OnlyParsing;
     const uint32_t uStartBits = fine ? 7 : 6;
     for (int32_t env = 0; env < pSbr->uNumEnv; ++env) {
         const uint32_t uRes = pSbr->uFreqRes[env];
@@ -183,7 +194,8 @@ void ParseEnvelopes(VrBitReader_OnlyParsing *pBits, VrSBRState_OnlyParsing *pSbr
             const int16_t *prev = env == 0 ? pSbr->iPrevEnvelope : pSbr->iEnvelope[env - 1];
             const uint32_t uPrevRes = env == 0 ? pSbr->uPrevFreqRes : pSbr->uFreqRes[env - 1];
             for (int32_t k = 0; k < numBands; ++k)
-                cur[k] = static_cast<int16_t>(prev[PreviousBand(*pSbr, k, uRes, uPrevRes)] + Huffman(pBits, timeTree));
+                cur[k] = static_cast<int16_t>(prev[PreviousBand(*pSbr, k, uRes, uPrevRes)] +
+                                              Huffman(pBits, timeTree));
         }
     }
     memcpy(pSbr->iPrevEnvelope, pSbr->iEnvelope[pSbr->uNumEnv - 1], sizeof pSbr->iPrevEnvelope);
@@ -204,7 +216,8 @@ void ParseNoise(VrBitReader_OnlyParsing *pBits, VrSBRState_OnlyParsing *pSbr)
         } else {
             const int16_t *prev = n == 0 ? pSbr->iPrevNoise : pSbr->iNoise[n - 1];
             for (int32_t k = 0; k < pSbr->uNumNoiseBands; ++k)
-                cur[k] = static_cast<int16_t>(prev[k] + Huffman(pBits, t_huffman_noise_3_0dB_OnlyParsing));
+                cur[k] = static_cast<int16_t>(prev[k] +
+                                              Huffman(pBits, t_huffman_noise_3_0dB_OnlyParsing));
         }
     }
     memcpy(pSbr->iPrevNoise, pSbr->iNoise[pSbr->uNumNoise - 1], sizeof pSbr->iPrevNoise);
@@ -212,7 +225,8 @@ void ParseNoise(VrBitReader_OnlyParsing *pBits, VrSBRState_OnlyParsing *pSbr)
 
 } // namespace
 
-int32_t ParseSingleChannel(VrBitReader_OnlyParsing *pBits, VrSBRState_OnlyParsing *pSbr, uint32_t uBorderUnit)
+int32_t ParseSingleChannel(VrBitReader_OnlyParsing *pBits, VrSBRState_OnlyParsing *pSbr,
+                           uint32_t uBorderUnit)
 {
     if (Bits(pBits, 1)) // bs_data_extra
         VrFlushBits_OnlyParsing(pBits, 4);
@@ -239,7 +253,8 @@ int32_t ParseSingleChannel(VrBitReader_OnlyParsing *pBits, VrSBRState_OnlyParsin
         uSize += Bits(pBits, 8); // bs_esc_count
     if (uSize == 0)
         return 1;
-    // Only the first extension id is read; the rest of the extended data is left unread.
+    // CONTRACT: only the first extension id is read; the rest of the extended data is left
+    // unread.
     pSbr->uExtensionId = Byte(pBits, 2);
     return pSbr->uExtensionId == kExtensionIdPs ? 2 : 1;
 }
@@ -267,8 +282,9 @@ extern "C" void sbrDecodeInitOnlyParsing(void *, VrSBRState_OnlyParsing *pSbr, u
     pSbr->uTimeRate = 1;
 }
 
-int32_t vorcal::aacparse::sbr::ExtensionData(VrBitReader_OnlyParsing *pBits, VrSBRState_OnlyParsing *pSbr,
-                                             uint32_t uElementId, bool &bTables)
+int32_t vorcal::aacparse::sbr::ExtensionData(VrBitReader_OnlyParsing *pBits,
+                                             VrSBRState_OnlyParsing *pSbr, uint32_t uElementId,
+                                             bool &bTables)
 {
     bTables = false;
     if (Bits(pBits, 4) == kExtensionSbrCrc)
@@ -286,11 +302,12 @@ int32_t vorcal::aacparse::sbr::ExtensionData(VrBitReader_OnlyParsing *pBits, VrS
 
     if (uElementId == 0) // single channel element
         return ParseSingleChannel(pBits, pSbr, pSbr->uTimeRate ? 2 : 1);
-    return uElementId == 1 ? 1 : 0; // channel pair SBR data is not parsed
+    // CONTRACT: channel pair SBR data is not parsed.
+    return uElementId == 1 ? 1 : 0;
 }
 
-extern "C" int32_t sbr_extension_dataOnlyParsing(VrBitReader_OnlyParsing *pBits, VrSBRState_OnlyParsing *pSbr,
-                                                 uint32_t uElementId)
+extern "C" int32_t sbr_extension_dataOnlyParsing(VrBitReader_OnlyParsing *pBits,
+                                                 VrSBRState_OnlyParsing *pSbr, uint32_t uElementId)
 {
     bool bTables = false;
     return ExtensionData(pBits, pSbr, uElementId, bTables);

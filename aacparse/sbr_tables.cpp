@@ -4,6 +4,7 @@
 #include <vorcal/aacparse.h>
 
 #include "aacparse/sbr_internal.hpp"
+#include "aacparse/syntax.hpp"
 
 // Offsets added to startMin, by bs_start_freq. Rows 0-5: 16, 22.05, 24, 32, 44.1-64 and above
 // 64 kHz; row 6 serves time grids of single QMF slots at any rate.
@@ -36,10 +37,14 @@ extern "C" constexpr uint8_t stopDk_t_tableOnlyParsing[12][14] = {
 namespace vorcal::aacparse::sbr {
 namespace {
 
-constexpr uint32_t kRates[12] = {96000, 88200, 64000, 48000, 44100, 32000, 24000, 22050, 16000, 12000, 11025, 8000};
-
-constexpr uint32_t StopMin(uint32_t fs) { return RoundedRatio(fs < 32000 ? 768000 : fs < 64000 ? 1024000 : 1280000, fs); }
-constexpr uint32_t StartMin(uint32_t fs) { return RoundedRatio(fs < 32000 ? 384000 : fs < 64000 ? 512000 : 640000, fs); }
+constexpr uint32_t StopMin(uint32_t fs)
+{
+    return RoundedRatio(fs < 32000 ? 768000 : fs < 64000 ? 1024000 : 1280000, fs);
+}
+constexpr uint32_t StartMin(uint32_t fs)
+{
+    return RoundedRatio(fs < 32000 ? 384000 : fs < 64000 ? 512000 : 640000, fs);
+}
 
 #if defined(__SIZEOF_INT128__)
 // The stop-band rows are checked where the compiler has 128-bit integers (64-bit hosts); the
@@ -48,7 +53,7 @@ constexpr uint32_t StartMin(uint32_t fs) { return RoundedRatio(fs < 32000 ? 3840
 constexpr bool StopRowMatches(uint32_t row)
 {
     __extension__ typedef unsigned __int128 U128;
-    const uint32_t s = StopMin(kRates[row]);
+    const uint32_t s = StopMin(aac::kSampleRates[row]);
     for (uint32_t i = 0; i < 14; ++i) {
         U128 v = U128{1} << 13;
         for (uint32_t j = 0; j < 13 - i; ++j)
@@ -69,7 +74,7 @@ constexpr bool StopRowMatches(uint32_t row)
 
 constexpr bool AllStopRowsMatch()
 {
-    for (uint32_t row = 0; row < 12; ++row)
+    for (uint32_t row = 0; row < aac::kSampleRates.size(); ++row)
         if (!StopRowMatches(row))
             return false;
     return true;
@@ -96,7 +101,8 @@ int32_t StartBand(const VrSBRState_OnlyParsing &sbr)
         row = 3;
     else if (fs > 64000)
         row = 5;
-    return static_cast<uint8_t>(StartMin(fs) + qmf_channel_offsetOnlyParsing[row][sbr.uStartFreq & 15]);
+    return static_cast<uint8_t>(StartMin(fs) +
+                                qmf_channel_offsetOnlyParsing[row][sbr.uStartFreq & 15]);
 }
 
 int32_t StopBand(const VrSBRState_OnlyParsing &sbr, int32_t k0)
@@ -108,13 +114,9 @@ int32_t StopBand(const VrSBRState_OnlyParsing &sbr, int32_t k0)
     }
     const uint8_t *row = stopDk_t_tableOnlyParsing[get_samplerate_idxOnlyParsing(sbr.uSampleRate)];
     int32_t diff[13];
-    for (int i = 0; i < 13; ++i) { // ascending insertion
-        const int32_t d = row[i + 1] - row[i];
-        int j = i;
-        for (; j > 0 && diff[j - 1] > d; --j)
-            diff[j] = diff[j - 1];
-        diff[j] = d;
-    }
+    for (int i = 0; i < 13; ++i)
+        diff[i] = row[i + 1] - row[i];
+    SortAscending(diff, 13);
     int32_t k2 = static_cast<int32_t>(StopMin(sbr.uSampleRate));
     for (uint32_t i = 0; i < uStop; ++i)
         k2 += diff[i];

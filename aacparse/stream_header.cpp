@@ -6,25 +6,14 @@
 #include "aacparse/decoder.hpp"
 
 namespace vorcal::aacparse {
-namespace {
-
-constexpr uint32_t kSync = 0xFFF;
-
-// Sync word test on the first two bytes: 0xFF and a second byte with its top four bits set.
-bool AdtsSync(const uint8_t *p) noexcept
-{
-    return p[0] == 0xFF && (p[1] & 0xF0) == 0xF0;
-}
-
-} // namespace
 
 int32_t AdtsHeader(VrAACDecoder_OnlyParsing &dec)
 {
     VrBitReader_OnlyParsing &bits = dec.Bits;
     VrByteAlign_OnlyParsing(&bits);
-    if (VrShowBits_OnlyParsing(&bits, 12) != kSync) {
+    if (VrShowBits_OnlyParsing(&bits, 12) != aac::kAdtsSyncword) {
         VrFlushBits_OnlyParsing(&bits, 8); // one resynchronisation attempt, a byte further on
-        if (VrShowBits_OnlyParsing(&bits, 12) != kSync)
+        if (VrShowBits_OnlyParsing(&bits, 12) != aac::kAdtsSyncword)
             return -1;
     }
     VrFlushBits_OnlyParsing(&bits, 12);
@@ -44,8 +33,8 @@ int32_t AdtsHeader(VrAACDecoder_OnlyParsing &dec)
         h.uOriginalCopy = Bits(dec, 1);
         h.uHome = Bits(dec, 1);
     } else {
-        // Skips 16 bits, 18 for MPEG-4, although the fixed header after the sync word is 16
-        // bits either way; kept as the decoder has always done (the flag is never set here).
+        // CONTRACT: skips 16 bits, 18 for MPEG-4, although the fixed header after the sync
+        // word is 16 bits either way (the flag is never set here).
         VrFlushBits_OnlyParsing(&bits, 16);
         if (h.uId == 0)
             VrFlushBits_OnlyParsing(&bits, 2);
@@ -124,6 +113,8 @@ int32_t ProgramConfig(VrAACDecoder_OnlyParsing &dec)
     return iTag;
 }
 
+namespace {
+
 int32_t AdifHeader(VrAACDecoder_OnlyParsing &dec)
 {
     VrADIFHeader_OnlyParsing &h = dec.ADIF;
@@ -150,8 +141,9 @@ int32_t AdifHeader(VrAACDecoder_OnlyParsing &dec)
     return uCounted ? 1 : -1;
 }
 
-int32_t DecInit(VrAACDecoder_OnlyParsing &dec, const uint8_t *pBuffer, uint32_t &uSampleRate, uint32_t &uChannels,
-                uint32_t &uFrameSamples, uint32_t &uSBR, uint32_t &uBitsAligned, uint32_t &uHeaderBits)
+int32_t DecInit(VrAACDecoder_OnlyParsing &dec, const uint8_t *pBuffer, uint32_t &uSampleRate,
+                uint32_t &uChannels, uint32_t &uFrameSamples, uint32_t &uSBR,
+                uint32_t &uBitsAligned, uint32_t &uHeaderBits)
 {
     VrBitReader_OnlyParsing &bits = dec.Bits;
     uSBR = 0;
@@ -169,9 +161,9 @@ int32_t DecInit(VrAACDecoder_OnlyParsing &dec, const uint8_t *pBuffer, uint32_t 
         VrBookMark_OnlyParsing(&bits, 1);
         AdifHeader(dec);
         uHeaderBits = VrGetProcessedBits_OnlyParsing(&bits);
-        uSampleRate = RateOf(dec.MCInfo.uSampleRateIdx);
+        uSampleRate = aac::RateOfIndex(dec.MCInfo.uSampleRateIdx);
         dec.uReportedChannels = static_cast<uint32_t>(dec.iConfiguredChannels);
-    } else if (AdtsSync(pBuffer)) {
+    } else if (aac::IsAdtsSync(pBuffer)) {
         dec.uADIF = 0;
         dec.uADTS = 1;
         VrInitBits_OnlyParsing(&bits, pBuffer);
@@ -179,7 +171,7 @@ int32_t DecInit(VrAACDecoder_OnlyParsing &dec, const uint8_t *pBuffer, uint32_t 
         VrBookMark_OnlyParsing(&bits, 1);
         AdtsHeader(dec);
         uHeaderBits = VrGetProcessedBits_OnlyParsing(&bits);
-        uSampleRate = RateOf(dec.MCInfo.uSampleRateIdx);
+        uSampleRate = aac::RateOfIndex(dec.MCInfo.uSampleRateIdx);
         dec.uReportedChannels = dec.ADTS.uChannelConfig;
     } else {
         // Headerless: the caller's rate and channel count describe the stream.
@@ -201,16 +193,18 @@ int32_t DecInit(VrAACDecoder_OnlyParsing &dec, const uint8_t *pBuffer, uint32_t 
     return 0;
 }
 
+} // namespace
 } // namespace vorcal::aacparse
 
 using namespace vorcal::aacparse;
 
 extern "C" int32_t VrAACDecInitOnlyParsing(VrAACDecoder_OnlyParsing *pDec, const uint8_t *pBuffer,
-                                           uint32_t *puSampleRate, uint32_t *puChannels, uint32_t *puFrameSamples,
-                                           uint32_t *puSBR, uint32_t *puBitsAligned, uint32_t *puHeaderBits)
+                                           uint32_t *puSampleRate, uint32_t *puChannels,
+                                           uint32_t *puFrameSamples, uint32_t *puSBR,
+                                           uint32_t *puBitsAligned, uint32_t *puHeaderBits)
 {
-    return DecInit(*pDec, pBuffer, *puSampleRate, *puChannels, *puFrameSamples, *puSBR, *puBitsAligned,
-                   *puHeaderBits);
+    return DecInit(*pDec, pBuffer, *puSampleRate, *puChannels, *puFrameSamples, *puSBR,
+                   *puBitsAligned, *puHeaderBits);
 }
 
 extern "C" int32_t get_adts_headerOnlyParsing(VrAACDecoder_OnlyParsing *pDec)

@@ -1,15 +1,23 @@
-// Rate tables of the parse-only decoder: sampling_frequency_index rates, the per-rate band
-// layout rows, the short band widths and the noise scale of perceptual noise substitution.
+// Rate tables of the parse-only decoder: sampling_frequency_index rates and the lookup of a
+// rate's index, the per-rate band layout rows, the short band widths and the noise scale of
+// perceptual noise substitution.
 #include <cstddef>
+#include <iterator>
 
 #include "aacparse/decoder.hpp"
+#include "aacparse/syntax.hpp"
 
 namespace {
 
+using vorcal::aac::kSampleRates;
+
+// The row of sampling_frequency_index uIndex with its long and short band tables.
 template <std::size_t L, std::size_t S>
-constexpr VrSampRateInfo_OnlyParsing Row(uint32_t uRate, const uint16_t (&long_)[L], const uint16_t (&short_)[S])
+constexpr VrSampRateInfo_OnlyParsing Row(uint32_t uIndex, const uint16_t (&long_)[L],
+                                         const uint16_t (&short_)[S])
 {
-    return {uRate, static_cast<uint32_t>(L), long_, static_cast<uint32_t>(S), short_};
+    return {kSampleRates[uIndex], static_cast<uint32_t>(L), long_, static_cast<uint32_t>(S),
+            short_};
 }
 
 // floor(sqrt(x)).
@@ -23,23 +31,33 @@ constexpr uint32_t ISqrt(uint32_t x)
 
 } // namespace
 
-extern "C" constexpr uint32_t VrTBL_SampleRates_OnlyParsing[12] = {96000, 88200, 64000, 48000, 44100, 32000,
-                                                                   24000, 22050, 16000, 12000, 11025, 8000};
+extern "C" constexpr uint32_t VrTBL_SampleRates_OnlyParsing[12] = {
+    kSampleRates[0], kSampleRates[1], kSampleRates[2], kSampleRates[3],
+    kSampleRates[4], kSampleRates[5], kSampleRates[6], kSampleRates[7],
+    kSampleRates[8], kSampleRates[9], kSampleRates[10], kSampleRates[11]};
+static_assert(std::size(VrTBL_SampleRates_OnlyParsing) == kSampleRates.size());
+
+// CONTRACT: every rate outside the table, 7350 Hz included, answers index 4 (44100 Hz).
+extern "C" uint32_t get_samplerate_idxOnlyParsing(uint32_t uSampleRate)
+{
+    const int32_t iIndex = vorcal::aac::IndexOfRate(uSampleRate);
+    return iIndex < 0 ? 4 : static_cast<uint32_t>(iIndex);
+}
 
 // Tables are shared between rates as in ISO/IEC 14496-3 4.5.4; rows 12-15 have no bands.
 extern "C" constexpr VrSampRateInfo_OnlyParsing samp_rate_infoOnlyParsing[16] = {
-    Row(96000, VrTBL_sfb_96_1024_OnlyParsing, VrTBL_sfb_96_128_OnlyParsing),
-    Row(88200, VrTBL_sfb_96_1024_OnlyParsing, VrTBL_sfb_96_128_OnlyParsing),
-    Row(64000, VrTBL_sfb_64_1024_OnlyParsing, VrTBL_sfb_64_128_OnlyParsing),
-    Row(48000, VrTBL_sfb_48_1024_OnlyParsing, VrTBL_sfb_48_128_OnlyParsing),
-    Row(44100, VrTBL_sfb_48_1024_OnlyParsing, VrTBL_sfb_48_128_OnlyParsing),
-    Row(32000, VrTBL_sfb_32_1024_OnlyParsing, VrTBL_sfb_48_128_OnlyParsing),
-    Row(24000, VrTBL_sfb_24_1024_OnlyParsing, VrTBL_sfb_24_128_OnlyParsing),
-    Row(22050, VrTBL_sfb_24_1024_OnlyParsing, VrTBL_sfb_24_128_OnlyParsing),
-    Row(16000, VrTBL_sfb_16_1024_OnlyParsing, VrTBL_sfb_16_128_OnlyParsing),
-    Row(12000, VrTBL_sfb_16_1024_OnlyParsing, VrTBL_sfb_16_128_OnlyParsing),
-    Row(11025, VrTBL_sfb_16_1024_OnlyParsing, VrTBL_sfb_16_128_OnlyParsing),
-    Row(8000, VrTBL_sfb_8_1024_OnlyParsing, VrTBL_sfb_8_128_OnlyParsing),
+    Row(0, VrTBL_sfb_96_1024_OnlyParsing, VrTBL_sfb_96_128_OnlyParsing), // 96000
+    Row(1, VrTBL_sfb_96_1024_OnlyParsing, VrTBL_sfb_96_128_OnlyParsing), // 88200
+    Row(2, VrTBL_sfb_64_1024_OnlyParsing, VrTBL_sfb_64_128_OnlyParsing), // 64000
+    Row(3, VrTBL_sfb_48_1024_OnlyParsing, VrTBL_sfb_48_128_OnlyParsing), // 48000
+    Row(4, VrTBL_sfb_48_1024_OnlyParsing, VrTBL_sfb_48_128_OnlyParsing), // 44100
+    Row(5, VrTBL_sfb_32_1024_OnlyParsing, VrTBL_sfb_48_128_OnlyParsing), // 32000
+    Row(6, VrTBL_sfb_24_1024_OnlyParsing, VrTBL_sfb_24_128_OnlyParsing), // 24000
+    Row(7, VrTBL_sfb_24_1024_OnlyParsing, VrTBL_sfb_24_128_OnlyParsing), // 22050
+    Row(8, VrTBL_sfb_16_1024_OnlyParsing, VrTBL_sfb_16_128_OnlyParsing), // 16000
+    Row(9, VrTBL_sfb_16_1024_OnlyParsing, VrTBL_sfb_16_128_OnlyParsing), // 12000
+    Row(10, VrTBL_sfb_16_1024_OnlyParsing, VrTBL_sfb_16_128_OnlyParsing), // 11025
+    Row(11, VrTBL_sfb_8_1024_OnlyParsing, VrTBL_sfb_8_128_OnlyParsing), // 8000
     {}, {}, {}, {},
 };
 
@@ -51,8 +69,7 @@ constexpr bool RowsMatch()
     constexpr uint32_t kShort[12] = {12, 12, 12, 14, 14, 14, 15, 15, 15, 15, 15, 15};
     for (int i = 0; i < 12; ++i) {
         const VrSampRateInfo_OnlyParsing &r = samp_rate_infoOnlyParsing[i];
-        if (r.uSampleRate != VrTBL_SampleRates_OnlyParsing[i] || r.uLongBands != kLong[i] ||
-            r.uShortBands != kShort[i])
+        if (r.uLongBands != kLong[i] || r.uShortBands != kShort[i])
             return false;
     }
     for (int i = 12; i < 16; ++i) {

@@ -12,13 +12,15 @@ bool IsDumpOpen(const CALHandle *hCAL, uint32_t uSlot) noexcept
     return hCAL && hCAL == LiveHandle() && uSlot < CAL_DUMP_SLOTS && hCAL->m_hDumpFile[uSlot] != 0;
 }
 
-void WriteDumpRecord(const CALHandle *hCAL, uint32_t uSlot, const uint8_t *pData, int32_t iLen) noexcept
+void WriteDumpRecord(const CALHandle *hCAL, uint32_t uSlot, const uint8_t *pData,
+                     int32_t iLen) noexcept
 {
     if (!IsDumpOpen(hCAL, uSlot) || iLen < 0 || (!pData && iLen != 0))
         return;
     const SALFile hFile = hCAL->m_hDumpFile[uSlot];
     const uint32_t uLen = static_cast<uint32_t>(iLen);
-    // Two writes, length then payload; their results are not examined.
+    // CONTRACT: two writes, the length in host byte order then the payload; their results are
+    // not examined.
     sal::WriteFile(hFile, &uLen, sizeof uLen);
     sal::WriteFile(hFile, pData, uLen);
 }
@@ -30,6 +32,7 @@ extern "C" CALParam vorCAL_DumpFrames(CALHandle *hCAL, const char *pPath, uint32
     using namespace vorcal;
     if (!hCAL || uSlot >= CAL_DUMP_SLOTS)
         return 0;
+    // CONTRACT: the result is the new file handle; with a null path, the result of closing.
     CALParam uResult = 0;
     if (hCAL->m_hDumpFile[uSlot] != 0) {
         uResult = static_cast<CALParam>(sal::CloseFile(hCAL->m_hDumpFile[uSlot]));

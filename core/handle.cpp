@@ -7,14 +7,12 @@
 
 #include "core/handle.hpp"
 #include "core/sal.hpp"
+#include "core/version.hpp"
 
 namespace {
 
 // The one handle; plain data, the engine serialises the core calls.
 CALHandle *g_hCAL = nullptr;
-
-constexpr uint32_t kMajorVersion = 1;
-constexpr uint32_t kMinorVersion = 1;
 
 } // namespace
 
@@ -25,8 +23,8 @@ const CALHandle *vorcal::core::LiveHandle() noexcept
 
 extern "C" CALHandle *vorCAL_GetHandle(uint32_t /*uReserved*/, uint32_t uMajor, uint32_t uMinor)
 {
-    // The version test comes first, also when a handle already exists.
-    if (uMajor != kMajorVersion || uMinor != kMinorVersion)
+    // CONTRACT: the version test comes first, also when a handle exists (its count stays).
+    if (uMajor != vorcal::version::kMajor || uMinor != vorcal::version::kMinor)
         return nullptr;
     if (g_hCAL) {
         ++g_hCAL->m_uRefCount;
@@ -71,7 +69,8 @@ extern "C" int32_t vorCAL_RegisterCodec(CALHandle *hCAL, uint32_t eMediaType, ui
     pEntry->uCodecObjectTypeIndication = uCodecObjectTypeIndication;
     pEntry->uMediaType = static_cast<uint16_t>(eMediaType);
     pEntry->uCodecMode = static_cast<uint16_t>(eMode);
-    // At most six slots are copied; a shorter table leaves the other slots null.
+    // CONTRACT: at most six slots are copied, bytes beyond them are ignored; a shorter table
+    // leaves the other slots null.
     const size_t uCopy = std::min<size_t>(uFunctionsSize, sizeof pEntry->Functions);
     if (pFunctions && uCopy)
         std::memcpy(pEntry->Functions, pFunctions, uCopy);
@@ -89,6 +88,7 @@ extern "C" CALCodec *vorCAL_GetCodec(CALHandle *hCAL, uint32_t eMediaType, uint3
         _CE_Find(hCAL ? hCAL->m_pCodecList : nullptr, static_cast<uint16_t>(eMediaType & 0xFFFF),
                  static_cast<uint16_t>(eMode & 0xFFFF), uCodecObjectTypeIndication);
     if (!pEntry) {
+        // CONTRACT: the documented message, "not be found" included.
         VORCAL_TRACE(vorcal::kTraceError, 0,
                      "[CAL %d] vorCAL_GetCodec() : Codec Handle not be found [eMediaType = %d, "
                      "eMode = %d, uCodecObjectTypeIndication = %d]\n",
@@ -110,7 +110,8 @@ extern "C" void vorCAL_ReleaseCodec(CALCodec *hCodec)
 {
     if (!hCodec)
         return;
-    // The codec's Deinit is not called and the H.264 buffer is the Deinit wrapper's to free.
+    // CONTRACT: the codec's Deinit is not called and the H.264 buffer is left to the Deinit
+    // wrapper.
     if (hCodec->m_pSilenceFrame)
         vorcal::sal::Free(hCodec->m_pSilenceFrame);
     vorcal::sal::Free(hCodec);

@@ -38,7 +38,7 @@ extern "C" int32_t _CE_Add(CALCodecEntry **ppHead, CALCodecEntry *pNew)
          pEntry = pEntry->pNext) {
         ++uExamined;
         if (SameKeys(*pEntry, *pNew)) {
-            // Replace in place: the entry keeps its position in the list.
+            // CONTRACT: a known key is replaced in place (result 1), keeping its position.
             CALCodecEntry *pNext = pEntry->pNext;
             *pEntry = *pNew;
             pEntry->pNext = pNext;

@@ -1,5 +1,6 @@
 // Access to the host's system layer (vorSAL): the only way the library allocates memory,
-// writes files and traces. The table pointers are read afresh at every use.
+// writes files and traces. CONTRACT: the table pointers are read afresh at every use, never
+// cached, and only the documented slots are called.
 #pragma once
 
 #include <cstdint>
@@ -13,12 +14,6 @@ inline void *Alloc(uint32_t uSize) noexcept
 {
     SALMemoryTable *pTable = g_vorSALMemoryTable;
     return (pTable && pTable->Alloc) ? pTable->Alloc(uSize) : nullptr;
-}
-
-template <typename T>
-inline T *AllocArray(uint32_t uCount) noexcept
-{
-    return static_cast<T *>(Alloc(static_cast<uint32_t>(uCount * sizeof(T))));
 }
 
 // Returns a block through slot 2 of the memory table.

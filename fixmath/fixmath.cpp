@@ -30,8 +30,8 @@ constexpr int32_t Interpolate(const std::array<int16_t, N> &t, int32_t y, int ba
 }
 
 // The division family shares its tail: the quotient of two magnitudes, the divisor scaled into
-// 15 bits by c right shifts (c = 0 unless the member scales), with the integer part of the
-// quotient carried as a signed 16-bit number.
+// 15 bits by c right shifts (c = 0 unless the member scales). CONTRACT: the integer part of
+// the quotient is carried as a signed 16-bit number, truncations included.
 enum class Remainder { k16, kSl, kL };
 
 int32_t Quotient(int32_t a, int32_t b, int32_t A, int32_t B, Remainder kind, bool scale)
@@ -49,7 +49,9 @@ int32_t Quotient(int32_t a, int32_t b, int32_t A, int32_t B, Remainder kind, boo
             ++c;
         }
     // Scales a dividend by 2^(15 - c); for c = 16 that is one right shift.
-    auto scaled = [c](int64_t v) { return c <= 15 ? To32(v * (int64_t{1} << (15 - c))) : To32(v >> (c - 15)); };
+    auto scaled = [c](int64_t v) {
+        return c <= 15 ? To32(v * (int64_t{1} << (15 - c))) : To32(v >> (c - 15));
+    };
     if (A < B)
         return To32(sign * (int64_t{scaled(A)} / Bs));
     const int64_t q = int64_t{A} / B;
@@ -84,7 +86,8 @@ int32_t Pow2Shifted(int32_t s, int32_t f)
     int32_t j = f >> 10;
     j = j < 0 ? 0 : (j > 31 ? 31 : j);
     const int64_t g = int64_t{f & 0x3FF} << 5;
-    const int32_t L = To32(int64_t{kPow2Table[j]} * 65536 - 2 * g * (kPow2Table[j] - kPow2Table[j + 1]));
+    const int32_t L =
+        To32(int64_t{kPow2Table[j]} * 65536 - 2 * g * (kPow2Table[j] - kPow2Table[j + 1]));
     if (s == 0)
         return L;
     return (L >> s) + ((L >> (s - 1)) & 1);
@@ -145,7 +148,7 @@ extern "C" void Div_exp(int32_t a, int32_t b, int32_t *piInt, int32_t *piFrac)
         *piFrac = 0;
         return;
     }
-    if (b == 0) { // a > 0: no quotient to report
+    if (b == 0) { // CONTRACT: a > 0 over 0 reports (0, 0)
         *piFrac = 0;
         return;
     }
@@ -181,9 +184,10 @@ extern "C" int32_t Mul_ls(int32_t a, int32_t b)
     return S > 0x3FFFFFFF ? 0x7FFFFFFF : To32(S * 2);
 }
 
-extern "C" void Mul_exp(int32_t e1, int32_t f1, int32_t e2, int32_t f2, int32_t *piInt, int32_t *piFrac)
+extern "C" void Mul_exp(int32_t e1, int32_t f1, int32_t e2, int32_t f2, int32_t *piInt,
+                        int32_t *piFrac)
 {
-    // 32-bit arithmetic throughout.
+    // CONTRACT: 32-bit arithmetic throughout, wrap-around included.
     const int32_t C = To32(int64_t{To32(int64_t{e1} * f2)} + To32(int64_t{f1} * e2));
     int32_t F = To32(int64_t{To32(int64_t{To32(int64_t{f1} * f2)} * 2) >> 16} + (C & 0x7FFF));
     int32_t E = To32(int64_t{To32(int64_t{e1} * e2)} + (To32(int64_t{C} * 2) >> 16));
@@ -210,7 +214,8 @@ extern "C" int16_t Sqrt_s_exp(int32_t x)
     const int32_t y = x << n;
     const int j = (y >> 9) - 16;
     const int32_t g = (y & 0x1FF) << 6;
-    const int16_t v = static_cast<int16_t>(kSqrtTable[j] - (((kSqrtTable[j] - kSqrtTable[j + 1]) * g) >> 15));
+    const int16_t v =
+        static_cast<int16_t>(kSqrtTable[j] - (((kSqrtTable[j] - kSqrtTable[j + 1]) * g) >> 15));
     return static_cast<int16_t>(v >> (n / 2));
 }
 

@@ -77,14 +77,16 @@ inline constexpr std::array<int16_t, 49> kInvSqrtTable = [] {
 inline constexpr std::array<int16_t, 33> kPow2Table = [] {
     std::array<int16_t, 33> p{};
     for (int j = 0; j < 33; ++j) {
-        const auto v = static_cast<int32_t>((detail::kPow2Q30[j] * 16384 + (uint64_t{1} << (detail::kPow2Q - 1))) >> detail::kPow2Q);
+        const auto v = static_cast<int32_t>(
+            (detail::kPow2Q30[j] * 16384 + (uint64_t{1} << (detail::kPow2Q - 1))) >>
+            detail::kPow2Q);
         p[j] = static_cast<int16_t>(v > 32767 ? 32767 : v);
     }
     return p;
 }();
 
-// About 32768 log2(1 + j / 32), kept as the decoder has always listed it; the last entry is
-// capped at 32767.
+// About 32768 log2(1 + j / 32). CONTRACT: the values as the decoder has always listed them,
+// not recomputed; the last entry is capped at 32767.
 inline constexpr std::array<int16_t, 33> kLog2Table = {
     0,     1455,  2866,  4236,  5568,  6863,  8124,  9352,  10549, 11716, 12855,
     13967, 15054, 16117, 17156, 18172, 19167, 20142, 21097, 22033, 22951, 23852,

@@ -1,5 +1,5 @@
 // A test-only AAC raw data block writer (ISO/IEC 13818-7 syntax), independent of the library:
-// codewords come from the codebook data in tests/data, quantised values are packed by the
+// codewords come from the codebook data in aacparse/data, quantised values are packed by the
 // codebooks' index formulas, with sign bits and escape sequences written as the standard lays
 // them out.
 #pragma once
@@ -19,6 +19,22 @@ namespace vorcal::test {
 
 using Code = std::pair<uint32_t, unsigned>; // codeword, length
 
+// The data lines of a table in aacparse/data, '#' comments left out; the column header fails
+// the callers' numeric fields.
+inline std::vector<std::string> TableLines(const std::string &name)
+{
+    std::ifstream in(VORCAL_AAC_TABLE_DIR "/" + name);
+    std::vector<std::string> lines;
+    for (std::string line; std::getline(in, line);)
+        if (!line.empty() && line[0] != '#')
+            lines.push_back(line);
+    return lines;
+}
+inline Code CodeOf(const std::string &hex, int length)
+{
+    return {uint32_t(std::stoul(hex, nullptr, 16)), unsigned(length)};
+}
+
 // Spectral codebooks 1-11 by (codebook, index) and the scale factor codebook by difference.
 struct AacCodebooks {
     std::map<std::pair<int, int>, Code> spectral;
@@ -29,20 +45,18 @@ struct AacCodebooks {
     {
         static const AacCodebooks books = [] {
             AacCodebooks b;
-            std::ifstream spectral(VORCAL_TEST_DATA_DIR "/aac_spectral_codebooks.tsv");
-            std::string line, hex, values;
+            std::string hex, values;
             int cb = 0, index = 0, length = 0, diff = 0;
-            while (std::getline(spectral, line)) // '#' comments; the column header fails the numeric fields
-                if (std::istringstream row(line); line[0] != '#' && row >> cb >> index >> length >> hex >> values) {
-                    b.spectral[{cb, index}] = {uint32_t(std::stoul(hex, nullptr, 16)), unsigned(length)};
+            for (const std::string &line : TableLines("aac_spectral_codebooks.tsv"))
+                if (std::istringstream row(line); row >> cb >> index >> length >> hex >> values) {
+                    b.spectral[{cb, index}] = CodeOf(hex, length);
                     std::istringstream list(values);
                     for (std::string v; std::getline(list, v, ',');)
                         b.values[{cb, index}].push_back(std::stoi(v));
                 }
-            std::ifstream scalefactor(VORCAL_TEST_DATA_DIR "/aac_scalefactor_codebook.tsv");
-            while (std::getline(scalefactor, line))
-                if (std::istringstream row(line); line[0] != '#' && row >> index >> length >> hex >> diff)
-                    b.scalefactor[diff] = {uint32_t(std::stoul(hex, nullptr, 16)), unsigned(length)};
+            for (const std::string &line : TableLines("aac_scalefactor_codebook.tsv"))
+                if (std::istringstream row(line); row >> index >> length >> hex >> diff)
+                    b.scalefactor[diff] = CodeOf(hex, length);
             return b;
         }();
         return books;
@@ -50,7 +64,10 @@ struct AacCodebooks {
 };
 
 inline void PutCode(BitWriter &w, Code c) { w.Put(c.first, c.second); }
-inline void PutScalefactorDiff(BitWriter &w, int diff) { PutCode(w, AacCodebooks::Get().scalefactor.at(diff)); }
+inline void PutScalefactorDiff(BitWriter &w, int diff)
+{
+    PutCode(w, AacCodebooks::Get().scalefactor.at(diff));
+}
 
 inline bool SignedBook(int cb) { return cb == 1 || cb == 2 || cb == 5 || cb == 6; }
 inline unsigned Dimension(int cb) { return cb <= 4 ? 4 : 2; }
@@ -63,7 +80,8 @@ inline void PutLines(BitWriter &w, int cb, const std::vector<int> &lines)
     for (size_t j = 0; j < lines.size(); j += dim) {
         int q[4] = {};
         for (unsigned d = 0; d < dim; ++d)
-            q[d] = SignedBook(cb) ? lines[j + d] : std::min(std::abs(lines[j + d]), cb == 11 ? 16 : 99);
+            q[d] = SignedBook(cb) ? lines[j + d]
+                                  : std::min(std::abs(lines[j + d]), cb == 11 ? 16 : 99);
         int index = 0;
         if (cb <= 2)
             index = 27 * (q[0] + 1) + 9 * (q[1] + 1) + 3 * (q[2] + 1) + (q[3] + 1);
@@ -89,13 +107,20 @@ inline void PutLines(BitWriter &w, int cb, const std::vector<int> &lines)
 }
 
 // ics_info of a long window (ONLY_LONG_SEQUENCE, no prediction).
-inline void PutLongInfo(BitWriter &w, unsigned maxSfb) { w.Put(0, 1).Put(0, 2).Put(0, 1).Put(maxSfb, 6).Put(0, 1); }
+inline void PutLongInfo(BitWriter &w, unsigned maxSfb)
+{
+    w.Put(0, 1).Put(0, 2).Put(0, 1).Put(maxSfb, 6).Put(0, 1);
+}
 
 // ics_info of an EIGHT_SHORT_SEQUENCE with its scale_factor_grouping bits.
-inline void PutShortInfo(BitWriter &w, unsigned maxSfb, unsigned grouping) { w.Put(0, 1).Put(2, 2).Put(1, 1).Put(maxSfb, 4).Put(grouping, 7); }
+inline void PutShortInfo(BitWriter &w, unsigned maxSfb, unsigned grouping)
+{
+    w.Put(0, 1).Put(2, 2).Put(1, 1).Put(maxSfb, 4).Put(grouping, 7);
+}
 
 // section_data of one group: (codebook, length) pairs, lengths in sectBits pieces with escapes.
-inline void PutSections(BitWriter &w, const std::vector<std::pair<unsigned, unsigned>> &sections, unsigned sectBits = 5)
+inline void PutSections(BitWriter &w, const std::vector<std::pair<unsigned, unsigned>> &sections,
+                        unsigned sectBits = 5)
 {
     const unsigned esc = (1u << sectBits) - 1;
     for (auto [cb, len] : sections) {

@@ -1,17 +1,14 @@
 // The ADTS header of silence frames and of AAC type detection (ISO/IEC 13818-7 adts_fixed_header
 // and adts_variable_header): profile 2, buffer fullness 0x7CF.
-#include <cstddef>
-
 #include <vorcal/audio_tools.h>
 
 #include "core/sal.hpp"
-#include "tools/aac_rates.hpp"
+#include "aacparse/syntax.hpp"
 
 namespace {
 
-using vorcal::tools::aac::kSampleRates;
-
-// The caller zeroes the header; each field is added into its byte (modulo 256).
+// CONTRACT: the caller zeroes the header; each field is added into its byte (modulo 256), so
+// a header that is not zero gets sums.
 void AddTo(uint8_t *pHeader, int i, uint32_t uValue) noexcept
 {
     pHeader[i] = static_cast<uint8_t>(pHeader[i] + uValue);
@@ -21,19 +18,16 @@ void AddTo(uint8_t *pHeader, int i, uint32_t uValue) noexcept
 
 extern "C" int32_t mute_get_samplerate_idx(int32_t iSamplingRate)
 {
-    // Exact rates only: no rounding to a nearby one.
-    for (std::size_t i = 0; i < kSampleRates.size(); ++i) {
-        if (iSamplingRate >= 0 && kSampleRates[i] == static_cast<uint32_t>(iSamplingRate))
-            return static_cast<int32_t>(i);
-    }
-    return -1;
+    return iSamplingRate < 0 ? -1 : vorcal::aac::IndexOfRate(static_cast<uint32_t>(iSamplingRate));
 }
 
-extern "C" int32_t AAC_MakeADTS(uint8_t *pHeader, int32_t uSamplingRate, uint32_t uChannels, int32_t uMode,
-                                uint32_t uRawLen)
+extern "C" int32_t AAC_MakeADTS(uint8_t *pHeader, int32_t uSamplingRate, uint32_t uChannels,
+                                int32_t uMode, uint32_t uRawLen)
 {
-    VORCAL_TRACE(vorcal::kTraceAudio, 2, "AAC_MakeADTS() : %u, %u, %u, %u\n", static_cast<unsigned>(uSamplingRate),
-                 uChannels, static_cast<unsigned>(uMode), uRawLen);
+    // CONTRACT: traced, and the first three bytes written, before any argument is checked.
+    VORCAL_TRACE(vorcal::kTraceAudio, 2, "AAC_MakeADTS() : %u, %u, %u, %u\n",
+                 static_cast<unsigned>(uSamplingRate), uChannels, static_cast<unsigned>(uMode),
+                 uRawLen);
     AddTo(pHeader, 0, 0xFF);
     AddTo(pHeader, 1, 0xF9); // syncword end, ID 1 (MPEG-2), layer 0, protection_absent 1
     AddTo(pHeader, 2, 0x80); // profile 2
@@ -54,7 +48,7 @@ extern "C" int32_t AAC_MakeADTS(uint8_t *pHeader, int32_t uSamplingRate, uint32_
     } else {
         AddTo(pHeader, 3, 0x40); // parametric stereo: channel configuration 1
     }
-    const uint32_t uFrameLen = uRawLen + 7;
+    const uint32_t uFrameLen = uRawLen + vorcal::aac::kAdtsHeaderSize;
     AddTo(pHeader, 3, (uFrameLen >> 11) & 3);
     AddTo(pHeader, 4, (uFrameLen >> 3) & 0xFF);
     AddTo(pHeader, 5, 0x1F + ((uFrameLen << 5) & 0xFF));

@@ -1,15 +1,15 @@
-// Silence frames: the AAC raw-data-block templates behind an optional ADTS header, and the
-// per-instance cache that vorCALTools_GetSilenceFrame fills for AAC, AAC with SBR and DRA.
+// AAC silence frames: the raw-data-block templates behind an optional ADTS header, and the
+// allocation step every mute-frame generator shares. The per-instance cache of
+// vorCALTools_GetSilenceFrame belongs to the codec instance, in the wrapper layer.
 #include <array>
 #include <cstring>
 #include <span>
 
 #include <vorcal/audio_tools.h>
 
+#include "aacparse/syntax.hpp"
 #include "core/sal.hpp"
-#include "tools/aac_rates.hpp"
 #include "tools/mute_frame.hpp"
-#include "wrapper/codec_slots.hpp"
 
 namespace vorcal::tools::mute {
 namespace {
@@ -32,8 +32,8 @@ constexpr auto kAacMode4 = std::to_array<uint8_t>({
     0x00, 0xD0, 0x30, 0x83, 0xE2, 0x5B, 0x66, 0x39, 0x40, 0xCC, 0x9B, 0x37, 0x14, 0x05, 0xD0, 0x40,
     0x00, 0x00, 0x00, 0x03, 0x89, 0x50, 0x40, 0x38});
 
-constexpr std::array<std::span<const uint8_t>, 5> kAacModes = {kAacMode0, kAacMode1, kAacMode2, kAacMode3,
-                                                               kAacMode4};
+constexpr std::array<std::span<const uint8_t>, 5> kAacModes = {kAacMode0, kAacMode1, kAacMode2,
+                                                               kAacMode3, kAacMode4};
 static_assert(kAacMode0.size() == 11 && kAacMode1.size() == 17 && kAacMode2.size() == 22 &&
               kAacMode3.size() == 31 && kAacMode4.size() == 24);
 // id_syn_ele: ID_SCE (0) for the mono templates, ID_CPE (1) with element tag 0 for the stereo ones.
@@ -44,56 +44,10 @@ constexpr int32_t kFirstSbrMode = 2;
 constexpr uint32_t kMinRate = 8000;
 constexpr uint32_t kMaxRate = 96000;
 
-// AMR storage-format header of frame type 15 (no data) with Q = 1: the AMR-NB and AMR-WB silence.
-constexpr std::array<uint8_t, 1> kAmrNoData = {0x7C};
-
-constexpr uint32_t kNoSilenceFrame = 16;
-
-// Result 16 with the outputs cleared.
-int32_t NoSilenceFrame(const uint8_t **ppFrame, uint32_t *puFrameLen) noexcept
-{
-    *ppFrame = nullptr;
-    *puFrameLen = 0;
-    return static_cast<int32_t>(kNoSilenceFrame);
-}
-
-// Fills an empty cache with an AAC frame of the mode for uChannels (modes[0] mono, modes[1]
-// stereo); a failed build leaves the cache empty so that the next call tries again.
-int32_t FillAacCache(CALCodec *hCodec, const std::array<int32_t, 2> &modes, int32_t iBadChannels,
-                     uint32_t uSamplingRate, uint32_t uChannels, uint32_t uReserved, uint32_t bADTS) noexcept
-{
-    if (hCodec->m_pSilenceFrame)
-        return 0;
-    if (uChannels != 1 && uChannels != 2)
-        return iBadChannels;
-    uint8_t *pFrame = nullptr;
-    uint32_t uLen = 0;
-    const int32_t iResult = AacMuteFrame(&pFrame, &uLen, uReserved, uSamplingRate, uChannels, bADTS,
-                                         modes[uChannels - 1]);
-    if (iResult != 0)
-        return iResult;
-    hCodec->m_pSilenceFrame = pFrame;
-    hCodec->m_uSilenceFrameLen = uLen;
-    return 0;
-}
-
-int32_t FillDraCache(CALCodec *hCodec, uint32_t uSamplingRate, uint32_t uChannels) noexcept
-{
-    if (hCodec->m_pSilenceFrame)
-        return 0;
-    uint8_t *pFrame = nullptr;
-    uint32_t uLen = 0;
-    if (DraMuteFrame(&pFrame, &uLen, uSamplingRate, uChannels) != 0)
-        return -1;
-    hCodec->m_pSilenceFrame = pFrame;
-    hCodec->m_uSilenceFrameLen = uLen;
-    return 0;
-}
-
 } // namespace
 
-int32_t AllocateFrame(std::span<const uint8_t> header, std::span<const uint8_t> body, uint8_t **ppFrame,
-                      uint32_t *puFrameLen) noexcept
+int32_t AllocateFrame(std::span<const uint8_t> header, std::span<const uint8_t> body,
+                      uint8_t **ppFrame, uint32_t *puFrameLen) noexcept
 {
     const uint32_t uLen = static_cast<uint32_t>(header.size() + body.size());
     auto *pFrame = static_cast<uint8_t *>(sal::Alloc(uLen));
@@ -108,8 +62,9 @@ int32_t AllocateFrame(std::span<const uint8_t> header, std::span<const uint8_t> 
     return 0;
 }
 
-int32_t AacMuteFrame(uint8_t **ppFrame, uint32_t *puFrameLen, uint32_t /*uReserved*/, uint32_t uSamplingRate,
-                     uint32_t uChannels, uint32_t bADTS, int32_t iMode) noexcept
+int32_t AacMuteFrame(uint8_t **ppFrame, uint32_t *puFrameLen, uint32_t /*uReserved*/,
+                     uint32_t uSamplingRate, uint32_t uChannels, uint32_t bADTS,
+                     int32_t iMode) noexcept
 {
     if (!ppFrame || !puFrameLen)
         return -1;
@@ -123,69 +78,24 @@ int32_t AacMuteFrame(uint8_t **ppFrame, uint32_t *puFrameLen, uint32_t /*uReserv
     // The SBR modes pass the output rate; AAC_MakeADTS halves it back to the core rate, so they
     // accept up to 48000 Hz only.
     const uint32_t uHeaderRate = iMode >= kFirstSbrMode ? uSamplingRate * 2 : uSamplingRate;
-    std::array<uint8_t, aac::kAdtsHeaderSize> header{};
+    std::array<uint8_t, vorcal::aac::kAdtsHeaderSize> header{};
     if (AAC_MakeADTS(header.data(), static_cast<int32_t>(uHeaderRate), uChannels, iMode,
                      static_cast<uint32_t>(body.size())) != 0) {
-        *puFrameLen = static_cast<uint32_t>(body.size()); // the template length stays behind
+        // CONTRACT: the template length stays behind in the length output.
+        *puFrameLen = static_cast<uint32_t>(body.size());
         return -1;
     }
     return AllocateFrame(header, body, ppFrame, puFrameLen);
-}
-
-int32_t GetSilenceFrame(CALCodec *hCodec, uint32_t uSamplingRate, uint32_t uChannels, uint32_t uReserved,
-                        uint32_t bADTS, const uint8_t **ppFrame, uint32_t *puFrameLen) noexcept
-{
-    if (!hCodec) {
-        VORCAL_TRACE(kTraceError, 0, "[CAL_Tools %d] vorCALTools_GetSilenceFrame() : Codec Handle is NULL....\n",
-                     594);
-        return 1;
-    }
-    const uint32_t uOTI = hCodec->m_uCodecObjectTypeIndication;
-    // Asked on every call, also with a frame cached. An unanswered query reads 0: no frames.
-    if ((uOTI == CAL_OTI_AAC || uOTI == CAL_OTI_AAC_SBR) &&
-        wrapper::AudioPropertyValue(hCodec, CAL_PROP_AAC_SILENCE_FRAMES) == 0)
-        return NoSilenceFrame(ppFrame, puFrameLen);
-
-    int32_t iResult = 0;
-    switch (uOTI) {
-    case CAL_OTI_AAC:
-        iResult = FillAacCache(hCodec, {0, 1}, 1, uSamplingRate, uChannels, uReserved, bADTS);
-        break;
-    case CAL_OTI_AAC_SBR:
-        iResult = FillAacCache(hCodec, {2, 3}, -1, uSamplingRate, uChannels, uReserved, bADTS);
-        break;
-    case CAL_OTI_AMR_NB:
-    case CAL_OTI_AMR_WB:
-        // Static, never cached: the instance's cache may hold the locked AMR frame instead.
-        *ppFrame = kAmrNoData.data();
-        *puFrameLen = kAmrNoData.size();
-        return 0;
-    case CAL_OTI_DRA:
-        iResult = FillDraCache(hCodec, uSamplingRate, uChannels);
-        break;
-    default:
-        return NoSilenceFrame(ppFrame, puFrameLen);
-    }
-    if (iResult != 0)
-        return iResult;
-    *ppFrame = hCodec->m_pSilenceFrame;
-    *puFrameLen = hCodec->m_uSilenceFrameLen;
-    return 0;
 }
 
 } // namespace vorcal::tools::mute
 
 using namespace vorcal::tools;
 
-extern "C" int32_t vorCALTools_GetSilenceFrame(CALCodec *hCodec, uint32_t uSamplingRate, uint32_t uChannels,
-                                               uint32_t uReserved, uint32_t bADTS, const uint8_t **ppFrame,
-                                               uint32_t *puFrameLen)
+extern "C" int32_t AAC_MuteFrame(uint8_t **ppFrame, uint32_t *uFrameLen, uint32_t uReserved,
+                                 uint32_t uSamplingRate, uint32_t uChannels, uint32_t bADTS,
+                                 int32_t uMode)
 {
-    return mute::GetSilenceFrame(hCodec, uSamplingRate, uChannels, uReserved, bADTS, ppFrame, puFrameLen);
-}
-
-extern "C" int32_t AAC_MuteFrame(uint8_t **ppFrame, uint32_t *uFrameLen, uint32_t uReserved, uint32_t uSamplingRate,
-                                 uint32_t uChannels, uint32_t bADTS, int32_t uMode)
-{
-    return mute::AacMuteFrame(ppFrame, uFrameLen, uReserved, uSamplingRate, uChannels, bADTS, uMode);
+    return mute::AacMuteFrame(ppFrame, uFrameLen, uReserved, uSamplingRate, uChannels, bADTS,
+                              uMode);
 }

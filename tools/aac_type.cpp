@@ -4,55 +4,48 @@
 
 #include <vorcal/aacparse.h>
 #include <vorcal/audio_tools.h>
-#include <vorcal/wrapper.h>
 
+#include "aacparse/syntax.hpp"
 #include "core/sal.hpp"
+#include "tools/aac_type.hpp"
 
-namespace vorcal::tools {
+namespace vorcal::tools::aac {
 namespace {
 
-constexpr uint32_t kFailed = 0xFFFFFFFF;
-constexpr uint32_t kAdtsBytes = 7;
+using vorcal::aac::kAdtsHeaderSize;
+
 // VrAACSBRInfo reads 10 bytes of a header without CRC: frames under 2 bytes get extra zeros.
 constexpr uint32_t kMinDetectBytes = 10;
 
 } // namespace
 
-uint32_t GetAACType(CALCodec *hCodec, int32_t iSamplingRate, uint32_t uChannels, const uint8_t *pFrame,
-                    uint32_t uFrameLen)
+bool DetectSbr(int32_t iSamplingRate, uint32_t uChannels, const uint8_t *pFrame, uint32_t uFrameLen,
+               uint32_t &uSBR) noexcept
 {
-    if (!hCodec)
-        return kFailed;
-    const uint32_t uOti = hCodec->m_uCodecObjectTypeIndication;
-    if ((uOti != CAL_OTI_AAC && uOti != CAL_OTI_AAC_SBR) || !pFrame)
-        return uOti;
-    if (uFrameLen > UINT32_MAX - (kAdtsBytes + 1))
-        return kFailed; // no buffer of that size can exist
-    uint32_t uSize = uFrameLen + kAdtsBytes + 1;
+    if (uFrameLen > UINT32_MAX - (kAdtsHeaderSize + 1))
+        return false; // no buffer of that size can exist
+    // CONTRACT: one byte more than header and frame, zeroed, as the allocation size shows.
+    uint32_t uSize = uFrameLen + kAdtsHeaderSize + 1;
     if (uSize < kMinDetectBytes)
         uSize = kMinDetectBytes;
     auto *pBuf = static_cast<uint8_t *>(sal::Alloc(uSize));
     if (!pBuf)
-        return kFailed;
+        return false;
     std::memset(pBuf, 0, uSize);
-    if (AAC_MakeADTS(pBuf, iSamplingRate, uChannels, static_cast<int32_t>(uChannels - 1), uFrameLen) != 0) {
+    const auto iMode = static_cast<int32_t>(uChannels - 1);
+    if (AAC_MakeADTS(pBuf, iSamplingRate, uChannels, iMode, uFrameLen) != 0) {
         sal::Free(pBuf);
-        return kFailed;
+        return false;
     }
-    std::memcpy(pBuf + kAdtsBytes, pFrame, uFrameLen);
-    uint32_t uRate = 0, uChannelConfig = 0, uSBR = 0, uBitsAligned = 0, uHeaderBits = 0;
+    std::memcpy(pBuf + kAdtsHeaderSize, pFrame, uFrameLen);
+    uint32_t uRate = 0, uChannelConfig = 0, uBitsAligned = 0, uHeaderBits = 0;
+    uSBR = 0;
     VrAACSBRInfo(pBuf, uSize, &uRate, &uChannelConfig, &uSBR, &uBitsAligned, &uHeaderBits);
     sal::Free(pBuf);
-    VORCAL_TRACE(kTraceAudio, 1, "[CAL_Tools %d] vorCALTools_GetAACType() : %u, %u, %u, %u, %u\n", 562, uRate,
-                 uChannelConfig, uSBR, uBitsAligned, uHeaderBits);
-    hCodec->m_uCodecObjectTypeIndication = uSBR ? CAL_OTI_AAC_SBR : CAL_OTI_AAC;
-    return hCodec->m_uCodecObjectTypeIndication;
+    // CONTRACT: the source line in the trace is the fixed number 562.
+    VORCAL_TRACE(kTraceAudio, 1, "[CAL_Tools %d] vorCALTools_GetAACType() : %u, %u, %u, %u, %u\n",
+                 562, uRate, uChannelConfig, uSBR, uBitsAligned, uHeaderBits);
+    return true;
 }
 
-} // namespace vorcal::tools
-
-extern "C" uint32_t vorCALTools_GetAACType(CALCodec *hCodec, int32_t uSamplingRate, uint32_t uChannels,
-                                           const uint8_t *pFrame, uint32_t uFrameLen)
-{
-    return vorcal::tools::GetAACType(hCodec, uSamplingRate, uChannels, pFrame, uFrameLen);
-}
+} // namespace vorcal::tools::aac

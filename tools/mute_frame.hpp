@@ -4,21 +4,19 @@
 #include <cstdint>
 #include <span>
 
-#include <vorcal/wrapper.h>
-
 namespace vorcal::tools::mute {
 
 // Allocates header + body, copies both and stores buffer and length. When the allocation
 // fails nothing is stored and the result is -1; else 0.
-int32_t AllocateFrame(std::span<const uint8_t> header, std::span<const uint8_t> body, uint8_t **ppFrame,
-                      uint32_t *puFrameLen) noexcept;
+int32_t AllocateFrame(std::span<const uint8_t> header, std::span<const uint8_t> body,
+                      uint8_t **ppFrame, uint32_t *puFrameLen) noexcept;
 
-int32_t AacMuteFrame(uint8_t **ppFrame, uint32_t *puFrameLen, uint32_t uReserved, uint32_t uSamplingRate,
-                     uint32_t uChannels, uint32_t bADTS, int32_t iMode) noexcept;
+int32_t AacMuteFrame(uint8_t **ppFrame, uint32_t *puFrameLen, uint32_t uReserved,
+                     uint32_t uSamplingRate, uint32_t uChannels, uint32_t bADTS,
+                     int32_t iMode) noexcept;
 int32_t AmrNbMuteFrame(uint8_t **ppFrame, uint32_t *puFrameLen, uint32_t uFT) noexcept;
 int32_t AmrWbMuteFrame(uint8_t **ppFrame, uint32_t *puFrameLen, uint32_t uFT) noexcept;
-int32_t DraMuteFrame(uint8_t **ppFrame, uint32_t *puFrameLen, uint32_t uSamplingRate, uint32_t uChannels) noexcept;
-int32_t GetSilenceFrame(CALCodec *hCodec, uint32_t uSamplingRate, uint32_t uChannels, uint32_t uReserved,
-                        uint32_t bADTS, const uint8_t **ppFrame, uint32_t *puFrameLen) noexcept;
+int32_t DraMuteFrame(uint8_t **ppFrame, uint32_t *puFrameLen, uint32_t uSamplingRate,
+                     uint32_t uChannels) noexcept;
 
 } // namespace vorcal::tools::mute

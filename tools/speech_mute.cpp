@@ -18,7 +18,8 @@ constexpr auto kAmrNb0 = std::to_array<uint8_t>({
 constexpr auto kAmrNb1 = std::to_array<uint8_t>({
     0x0C, 0xC6, 0x3C, 0xC4, 0xFF, 0xF0, 0xC7, 0xB7, 0xEF, 0x7D, 0x0E, 0x00, 0x00, 0x00});
 constexpr auto kAmrNb2 = std::to_array<uint8_t>({
-    0x14, 0x47, 0x8D, 0x79, 0xEF, 0xE7, 0x8F, 0xE1, 0xEF, 0x98, 0xFF, 0x40, 0x00, 0x00, 0x00, 0x10});
+    0x14, 0x47, 0x8D, 0x79, 0xEF, 0xE7, 0x8F, 0xE1, 0xEF, 0x98, 0xFF, 0x40, 0x00, 0x00, 0x00, 0x10,
+});
 constexpr auto kAmrNb3 = std::to_array<uint8_t>({
     0x1C, 0x47, 0x95, 0xF3, 0xDF, 0xE0, 0x00, 0x7A, 0x1E, 0x43, 0x43, 0xC2, 0x40, 0x00, 0x00, 0x24,
     0x00, 0x00});
@@ -33,7 +34,8 @@ constexpr auto kAmrNb6 = std::to_array<uint8_t>({
     0x00, 0x00, 0x00, 0x00, 0x00, 0x00, 0x30, 0x00, 0x10, 0x60, 0x00});
 constexpr auto kAmrNb7 = std::to_array<uint8_t>({
     0x3C, 0x48, 0xF9, 0x1F, 0x96, 0x66, 0x78, 0x00, 0x00, 0x01, 0xE7, 0x8A, 0x00, 0x00, 0x00, 0x00,
-    0xC0, 0x00, 0x00, 0x00, 0x00, 0x00, 0x00, 0x00, 0x00, 0x00, 0x00, 0x00, 0x00, 0x00, 0x00, 0x00});
+    0xC0, 0x00, 0x00, 0x00, 0x00, 0x00, 0x00, 0x00, 0x00, 0x00, 0x00, 0x00, 0x00, 0x00, 0x00, 0x00,
+});
 
 constexpr auto kAmrWb0 = std::to_array<uint8_t>({
     0x04, 0x10, 0x20, 0x00, 0x21, 0x1C, 0x14, 0xD0, 0x11, 0x40, 0x4C, 0xC1, 0xA0, 0x50, 0x00, 0x00,
@@ -75,8 +77,8 @@ constexpr auto kAmrWb8 = std::to_array<uint8_t>({
 
 constexpr std::array<std::span<const uint8_t>, 8> kAmrNb = {kAmrNb0, kAmrNb1, kAmrNb2, kAmrNb3,
                                                             kAmrNb4, kAmrNb5, kAmrNb6, kAmrNb7};
-constexpr std::array<std::span<const uint8_t>, 9> kAmrWb = {kAmrWb0, kAmrWb1, kAmrWb2, kAmrWb3, kAmrWb4,
-                                                            kAmrWb5, kAmrWb6, kAmrWb7, kAmrWb8};
+constexpr std::array<std::span<const uint8_t>, 9> kAmrWb = {
+    kAmrWb0, kAmrWb1, kAmrWb2, kAmrWb3, kAmrWb4, kAmrWb5, kAmrWb6, kAmrWb7, kAmrWb8};
 
 // Frame sizes of RFC 4867 table 1 and 2, header byte included.
 constexpr std::array<uint32_t, 8> kAmrNbSizes = {13, 14, 16, 18, 20, 21, 27, 32};
@@ -105,22 +107,31 @@ constexpr auto kDra32000 = std::to_array<uint8_t>({
 static_assert(kDra48000.size() == 8 && kDra44100.size() == 8 && kDra32000.size() == 8);
 static_assert(kDra48000[0] == 0x7F && kDra48000[1] == 0xFF);
 
-// The two AMR flavours: templates and their trace lines.
+// The two AMR flavours: templates and their trace lines. CONTRACT: the traces carry the tag
+// [AAC_Mute, and fixed numbers where a source line would stand.
 struct Nb {
     static constexpr const auto &kTemplates = kAmrNb;
-    static void Refused() noexcept { VORCAL_TRACE(kTraceError, 0, "[AAC_Mute, %d] AMRNB_MuteFrame Error\n", 252); }
+    static void Refused() noexcept
+    {
+        VORCAL_TRACE(kTraceError, 0, "[AAC_Mute, %d] AMRNB_MuteFrame Error\n", 252);
+    }
     static void Built(int iFT, int iLen) noexcept
     {
-        VORCAL_TRACE(kTraceAudio, 0, "[AAC_Mute, %d] AMRNB FT = %d, FrameLen = %d\n", 189, iFT, iLen);
+        VORCAL_TRACE(kTraceAudio, 0, "[AAC_Mute, %d] AMRNB FT = %d, FrameLen = %d\n", 189, iFT,
+                     iLen);
     }
 };
 
 struct Wb {
     static constexpr const auto &kTemplates = kAmrWb;
-    static void Refused() noexcept { VORCAL_TRACE(kTraceError, 0, "[AAC_Mute, %d] AMRWB_MuteFrame Error\n", 380); }
+    static void Refused() noexcept
+    {
+        VORCAL_TRACE(kTraceError, 0, "[AAC_Mute, %d] AMRWB_MuteFrame Error\n", 380);
+    }
     static void Built(int iFT, int iLen) noexcept
     {
-        VORCAL_TRACE(kTraceAudio, 0, "[AAC_Mute, %d] AMRWB FT = %d, FrameLen = %d\n", 264, iFT, iLen);
+        VORCAL_TRACE(kTraceAudio, 0, "[AAC_Mute, %d] AMRWB FT = %d, FrameLen = %d\n", 264, iFT,
+                     iLen);
     }
 };
 
@@ -150,7 +161,8 @@ int32_t AmrWbMuteFrame(uint8_t **ppFrame, uint32_t *puFrameLen, uint32_t uFT) no
     return AmrMuteFrame<Wb>(ppFrame, puFrameLen, uFT);
 }
 
-int32_t DraMuteFrame(uint8_t **ppFrame, uint32_t *puFrameLen, uint32_t uSamplingRate, uint32_t uChannels) noexcept
+int32_t DraMuteFrame(uint8_t **ppFrame, uint32_t *puFrameLen, uint32_t uSamplingRate,
+                     uint32_t uChannels) noexcept
 {
     if (!puFrameLen) {
         VORCAL_TRACE(kTraceError, 0, "DRA_MuteFrame() uFrameLen is NULL\n");
@@ -159,7 +171,8 @@ int32_t DraMuteFrame(uint8_t **ppFrame, uint32_t *puFrameLen, uint32_t uSampling
     if (!ppFrame)
         return -1;
     if (uChannels != 2) {
-        VORCAL_TRACE(kTraceError, 0, "DRA_MuteFrame() channel num is not support %d\n", static_cast<int>(uChannels));
+        VORCAL_TRACE(kTraceError, 0, "DRA_MuteFrame() channel num is not support %d\n",
+                     static_cast<int>(uChannels));
         return -1;
     }
     std::span<const uint8_t> frame;
@@ -186,7 +199,8 @@ extern "C" int32_t AMRWB_MuteFrame(uint8_t **ppFrame, uint32_t *uFrameLen, uint3
     return mute::AmrWbMuteFrame(ppFrame, uFrameLen, uFT);
 }
 
-extern "C" int32_t DRA_MuteFrame(uint8_t **ppFrame, uint32_t *uFrameLen, uint32_t uSamplingRate, uint32_t uChannels)
+extern "C" int32_t DRA_MuteFrame(uint8_t **ppFrame, uint32_t *uFrameLen, uint32_t uSamplingRate,
+                                 uint32_t uChannels)
 {
     return mute::DraMuteFrame(ppFrame, uFrameLen, uSamplingRate, uChannels);
 }

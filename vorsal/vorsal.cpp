@@ -60,7 +60,8 @@ bool Enabled(int32_t iCategory, int32_t iLevel)
 {
     if (!g_filter.bParsed)
         ParseFilter(g_filter);
-    return iCategory >= 0 && iCategory <= kMaxCategory && iLevel >= 0 && iLevel <= g_filter.aMaxLevel[iCategory];
+    return iCategory >= 0 && iCategory <= kMaxCategory && iLevel >= 0 &&
+           iLevel <= g_filter.aMaxLevel[iCategory];
 }
 
 void VPrint(int32_t iCategory, int32_t iLevel, const char *pFormat, va_list args)
@@ -116,6 +117,7 @@ void PlainTrace(const char *pFormat, ...)
     va_end(args);
 }
 
+// CONTRACT: slot 1 of the memory table and slot 2 of the file table are reserved: null.
 SALMemoryTable g_memoryTable = {MemAlloc, nullptr, MemFree};
 SALFileTable g_fileTable = {FileOpen, FileClose, nullptr, FileWrite};
 SALTraceTable g_traceTable = {PlainTrace};

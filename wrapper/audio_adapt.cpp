@@ -17,7 +17,7 @@ bool IsAmr(uint32_t uOTI) noexcept
     return uOTI == CAL_OTI_AMR_NB || uOTI == CAL_OTI_AMR_WB;
 }
 
-// The storage-format header byte (RFC 4867 5.3) shifted right by 3, deliberately unmasked: a
+// The storage-format header byte (RFC 4867 5.3) shifted right by 3. CONTRACT: unmasked, so a
 // set padding bit yields a frame type above 15, which no template has.
 uint32_t FrameTypeOf(const uint8_t *pFrame) noexcept
 {
@@ -57,15 +57,17 @@ void LockAMRFrameType(CALCodec *hCodec, const uint8_t *pFrame, uint32_t uFrameLe
     // A new lock, or none, replaces the lock of an earlier Init.
     DropSilenceFrame(hCodec);
     if (uFT > (bNarrow ? kAmrNbMaxFT : kAmrWbMaxFT)) {
-        VORCAL_TRACE(kTraceError, 0, "[vorCAL_Wrapper, %d] AMR %s FT = [%d]\n", __LINE__, bNarrow ? "NB" : "WB",
-                     static_cast<int>(uFT));
+        VORCAL_TRACE(kTraceError, 0, "[vorCAL_Wrapper, %d] AMR %s FT = [%d]\n", __LINE__,
+                     bNarrow ? "NB" : "WB", static_cast<int>(uFT));
         return;
     }
     if (bNarrow) {
-        VORCAL_TRACE(kTraceAudio, 0, "[vorCAL_Wrapper, %d] AMR NB FT = [%d]\n", __LINE__, static_cast<int>(uFT));
+        VORCAL_TRACE(kTraceAudio, 0, "[vorCAL_Wrapper, %d] AMR NB FT = [%d]\n", __LINE__,
+                     static_cast<int>(uFT));
         AMRNB_MuteFrame(&hCodec->m_pSilenceFrame, &hCodec->m_uSilenceFrameLen, uFT);
     } else {
-        VORCAL_TRACE(kTraceAudio, 0, "[vorCAL_Wrapper, %d] AMR WB FT = [%d]\n", __LINE__, static_cast<int>(uFT));
+        VORCAL_TRACE(kTraceAudio, 0, "[vorCAL_Wrapper, %d] AMR WB FT = [%d]\n", __LINE__,
+                     static_cast<int>(uFT));
         AMRWB_MuteFrame(&hCodec->m_pSilenceFrame, &hCodec->m_uSilenceFrameLen, uFT);
     }
 }
@@ -73,8 +75,8 @@ void LockAMRFrameType(CALCodec *hCodec, const uint8_t *pFrame, uint32_t uFrameLe
 // A configuration shorter than the two DSI bytes (or none) leaves rate and channel count as
 // the codec wrote them and counts as plain AAC (no SBR): 1024 samples, 16 bits.
 void FillAudioStreamParameters(CALCodec *hCodec, const uint8_t *pConfig, int32_t iConfigLen,
-                               uint32_t *puSamplingRate, uint32_t *puNumOfChannels, uint32_t *puBitsPerSample,
-                               uint32_t *puSamplesPerFrame) noexcept
+                               uint32_t *puSamplingRate, uint32_t *puNumOfChannels,
+                               uint32_t *puBitsPerSample, uint32_t *puSamplesPerFrame) noexcept
 {
     if (AudioPropertyValue(hCodec, CAL_PROP_STREAM_PARAMETERS) != 1)
         return;
@@ -97,7 +99,7 @@ void FillAudioStreamParameters(CALCodec *hCodec, const uint8_t *pConfig, int32_t
     case CAL_OTI_AMR_NB:
     case CAL_OTI_NB_SPEECH:
     case CAL_OTI_AMR_WB:
-        // AMR-WB too gets the narrowband values (not 16000 Hz and 320 samples).
+        // CONTRACT: AMR-WB too gets the narrowband values (not 16000 Hz and 320 samples).
         Store(puSamplingRate, 8000);
         Store(puNumOfChannels, 1);
         Store(puBitsPerSample, 16);
@@ -108,12 +110,15 @@ void FillAudioStreamParameters(CALCodec *hCodec, const uint8_t *pConfig, int32_t
     }
 }
 
-// The length is compared first, so a zero-length (or null) frame is never read and is replaced.
+// CONTRACT: the length is compared first, so a zero-length (or null) frame is never read and
+// is replaced.
 AudioFrame SubstituteAMRFrame(const CALCodec *hCodec, AudioFrame frame) noexcept
 {
-    if (!IsAmr(hCodec->m_uCodecObjectTypeIndication) || !hCodec->m_pSilenceFrame || hCodec->m_uSilenceFrameLen == 0)
+    if (!IsAmr(hCodec->m_uCodecObjectTypeIndication) || !hCodec->m_pSilenceFrame ||
+        hCodec->m_uSilenceFrameLen == 0)
         return frame;
-    const bool bFits = frame.iLen >= 0 && static_cast<uint32_t>(frame.iLen) == hCodec->m_uSilenceFrameLen &&
+    const bool bFits = frame.iLen >= 0 &&
+                       static_cast<uint32_t>(frame.iLen) == hCodec->m_uSilenceFrameLen &&
                        frame.pData && FrameTypeOf(frame.pData) == hCodec->m_uAMRFrameType;
     if (bFits)
         return frame;

@@ -4,24 +4,27 @@
 
 #include "core/sal.hpp"
 #include "wrapper/codec_slots.hpp"
+#include "wrapper/intermediate.hpp"
 
 using namespace vorcal;
 using namespace vorcal::wrapper;
 
-extern "C" int32_t vorCAL_VideoDecoderGetProperty(CALCodec *hCodec, uint32_t uProperty, uint32_t *puValue)
+extern "C" int32_t vorCAL_VideoDecoderGetProperty(CALCodec *hCodec, uint32_t uProperty,
+                                                  uint32_t *puValue)
 {
     if (!hCodec)
         return -1;
     return CallSlot<CALGetPropertyFunc>(hCodec, kSlot0, uProperty, puValue);
 }
 
-extern "C" int32_t vorCAL_VideoDecoderGetOutput(CALCodec *hCodec, CALParam uParam1, CALParam uParam2,
-                                                CALParam uParam3, CALParam uParam4)
+extern "C" int32_t vorCAL_VideoDecoderGetOutput(CALCodec *hCodec, CALParam uParam1,
+                                                CALParam uParam2, CALParam uParam3,
+                                                CALParam uParam4)
 {
     if (!hCodec)
         return -1;
-    return CallSlot<CALVideoDecoderGetOutputFunc>(hCodec, kSlot4, uParam1, uParam2, uParam3, uParam4,
-                                                  hCodec->m_uUserData);
+    return CallSlot<CALVideoDecoderGetOutputFunc>(hCodec, kSlot4, uParam1, uParam2, uParam3,
+                                                  uParam4, hCodec->m_uUserData);
 }
 
 extern "C" int32_t vorCAL_VideoDecoderReset(CALCodec *hCodec)
@@ -35,16 +38,12 @@ extern "C" int32_t vorCAL_VideoDecoderDeinit(CALCodec *hCodec)
 {
     if (!hCodec)
         return -1;
-    // The intermediate H.264 buffer goes only when both its pointer and its size are set.
-    if (hCodec->m_pIntermediateFrame && hCodec->m_iIntermediateFrameSize != 0) {
-        sal::Free(hCodec->m_pIntermediateFrame);
-        hCodec->m_pIntermediateFrame = nullptr;
-        hCodec->m_iIntermediateFrameSize = 0;
-    }
+    ReleaseIntermediate(hCodec);
     return CallSlot<CALUserDataFunc>(hCodec, kSlot2, hCodec->m_uUserData);
 }
 
-extern "C" int32_t vorCAL_AudioDecoderGetProperty(CALCodec *hCodec, uint32_t uProperty, uint32_t *puValue)
+extern "C" int32_t vorCAL_AudioDecoderGetProperty(CALCodec *hCodec, uint32_t uProperty,
+                                                  uint32_t *puValue)
 {
     if (!hCodec)
         return -1;
@@ -65,22 +64,26 @@ extern "C" int32_t vorCAL_AudioDecoderDeinit(CALCodec *hCodec)
     return CallSlot<CALUserDataFunc>(hCodec, kSlot2, hCodec->m_uUserData);
 }
 
-extern "C" int32_t vorCAL_ImageDecoderGetProperty(CALCodec *hCodec, uint32_t uProperty, uint32_t *puValue)
+extern "C" int32_t vorCAL_ImageDecoderGetProperty(CALCodec *hCodec, uint32_t uProperty,
+                                                  uint32_t *puValue)
 {
     if (!hCodec)
         return -1;
     return CallSlot<CALGetPropertyFunc>(hCodec, kSlot0, uProperty, puValue);
 }
 
-extern "C" int32_t vorCAL_ImageDecoderGetHeader(CALCodec *hCodec, CALParam uParam1, CALParam uParam2,
-                                                CALParam uParam3, CALParam uParam4, CALParam uParam5,
-                                                CALParam uParam6, CALParam uParam7, CALParam uUserData)
+extern "C" int32_t vorCAL_ImageDecoderGetHeader(CALCodec *hCodec, CALParam uParam1,
+                                                CALParam uParam2, CALParam uParam3,
+                                                CALParam uParam4, CALParam uParam5,
+                                                CALParam uParam6, CALParam uParam7,
+                                                CALParam uUserData)
 {
     if (!hCodec)
         return -1;
     hCodec->m_uUserData = uUserData;
-    return CallSlot<CALImageDecoderGetHeaderFunc>(hCodec, kSlot1, uParam1, uParam2, uParam3, uParam4,
-                                                  uParam5, uParam6, uParam7, &hCodec->m_uUserData);
+    return CallSlot<CALImageDecoderGetHeaderFunc>(hCodec, kSlot1, uParam1, uParam2, uParam3,
+                                                  uParam4, uParam5, uParam6, uParam7,
+                                                  &hCodec->m_uUserData);
 }
 
 extern "C" int32_t vorCAL_ImageDecoderDecode(CALCodec *hCodec, CALParam uParam1, CALParam uParam2,
@@ -91,8 +94,8 @@ extern "C" int32_t vorCAL_ImageDecoderDecode(CALCodec *hCodec, CALParam uParam1,
     if (!hCodec)
         return -1;
     return CallSlot<CALImageDecoderDecodeFunc>(hCodec, kSlot2, uParam1, uParam2, uParam3, uParam4,
-                                               uParam5, uParam6, uParam7, uParam8, uParam9, uParam10,
-                                               hCodec->m_uUserData);
+                                               uParam5, uParam6, uParam7, uParam8, uParam9,
+                                               uParam10, hCodec->m_uUserData);
 }
 
 extern "C" int32_t vorCAL_TextDecoderInit(CALCodec *hCodec, CALParam uParam1, CALParam uParam2,
@@ -101,8 +104,9 @@ extern "C" int32_t vorCAL_TextDecoderInit(CALCodec *hCodec, CALParam uParam1, CA
     if (!hCodec)
         return -1;
     hCodec->m_uUserData = uUserData;
-    const int32_t iResult = CallSlot<CALTextDecoderInitFunc>(hCodec, kSlot1, uParam1, uParam2, uParam3,
-                                                             &hCodec->m_uUserData);
+    const int32_t iResult = CallSlot<CALTextDecoderInitFunc>(hCodec, kSlot1, uParam1, uParam2,
+                                                             uParam3, &hCodec->m_uUserData);
+    // CONTRACT: traced after the call, in the documented unbalanced form.
     VORCAL_TRACE(kTraceText, 0, "vorCAL_TextDecoderInit %d]", __LINE__);
     return iResult;
 }
@@ -114,8 +118,8 @@ extern "C" int32_t vorCAL_TextDecoderDecode(CALCodec *hCodec, const uint8_t *pDa
         return -1;
     VORCAL_TRACE(kTraceText, 4, "(vorCAL_TextDecoderDecode %d) pData=0x%X, iLen=%d\n", __LINE__,
                  sal::Hex32(pData), iLen);
-    return CallSlot<CALTextDecoderDecodeFunc>(hCodec, kSlot3, pData, iLen, uParam3, uParam4, uParam5,
-                                              hCodec->m_uUserData);
+    return CallSlot<CALTextDecoderDecodeFunc>(hCodec, kSlot3, pData, iLen, uParam3, uParam4,
+                                              uParam5, hCodec->m_uUserData);
 }
 
 extern "C" int32_t vorCAL_TextDecoderGetOutput(CALCodec *hCodec, CALParam uParam1)
@@ -134,7 +138,8 @@ extern "C" int32_t vorCAL_TextDecoderDeinit(CALCodec *hCodec)
     return CallSlot<CALUserDataFunc>(hCodec, kSlot2, hCodec->m_uUserData);
 }
 
-extern "C" int32_t vorCAL_VideoEncoderGetProperty(CALCodec *hCodec, uint32_t uProperty, uint32_t *puValue)
+extern "C" int32_t vorCAL_VideoEncoderGetProperty(CALCodec *hCodec, uint32_t uProperty,
+                                                  uint32_t *puValue)
 {
     if (!hCodec)
         return -1;
@@ -149,8 +154,9 @@ extern "C" int32_t vorCAL_VideoEncoderInit(CALCodec *hCodec, CALParam uParam1, C
     if (!hCodec)
         return -1;
     hCodec->m_uUserData = uUserData;
-    return CallSlot<CALVideoEncoderInitFunc>(hCodec, kSlot1, uParam1, uParam2, uParam3, uParam4, uParam5,
-                                             uParam6, uParam7, uParam8, uParam9, &hCodec->m_uUserData);
+    return CallSlot<CALVideoEncoderInitFunc>(hCodec, kSlot1, uParam1, uParam2, uParam3, uParam4,
+                                             uParam5, uParam6, uParam7, uParam8, uParam9,
+                                             &hCodec->m_uUserData);
 }
 
 extern "C" int32_t vorCAL_VideoEncoderEncode(CALCodec *hCodec, CALParam uParam1, CALParam uParam2,
@@ -159,8 +165,8 @@ extern "C" int32_t vorCAL_VideoEncoderEncode(CALCodec *hCodec, CALParam uParam1,
 {
     if (!hCodec)
         return -1;
-    return CallSlot<CALVideoEncoderEncodeFunc>(hCodec, kSlot3, uParam1, uParam2, uParam3, uParam4, uParam5,
-                                               uParam6, hCodec->m_uUserData);
+    return CallSlot<CALVideoEncoderEncodeFunc>(hCodec, kSlot3, uParam1, uParam2, uParam3, uParam4,
+                                               uParam5, uParam6, hCodec->m_uUserData);
 }
 
 extern "C" int32_t vorCAL_VideoEncoderSkip(CALCodec *hCodec, CALParam uParam1, CALParam uParam2)

@@ -2,8 +2,22 @@
 
 #include <cstdlib>
 
+namespace {
+
+std::string FromEnvironment(const char *pName, const char *pDefault)
+{
+    const char *pDir = std::getenv(pName);
+    return pDir && *pDir ? pDir : pDefault;
+}
+
+} // namespace
+
 std::string vorcal::test::DataDir()
 {
-    const char *pDir = std::getenv("VORCAL_TEST_DATA_DIR");
-    return pDir && *pDir ? pDir : VORCAL_TEST_DATA_DEFAULT;
+    return FromEnvironment("VORCAL_TEST_DATA_DIR", VORCAL_TEST_DATA_DEFAULT);
+}
+
+std::string vorcal::test::AacTableDir()
+{
+    return FromEnvironment("VORCAL_AAC_TABLE_DIR", VORCAL_AAC_TABLE_DEFAULT);
 }

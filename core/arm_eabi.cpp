@@ -6,6 +6,10 @@
 
 extern "C" {
 
+// The run-time ABI names these hooks but no header declares them.
+int __aeabi_idiv0(int iReturn);
+long long __aeabi_ldiv0(long long iReturn);
+
 __attribute__((visibility("hidden"), used)) int __aeabi_idiv0(int iReturn)
 {
     return iReturn;
